@@ -1,0 +1,35 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+namespace marrowdale::benchmarks {
+
+// A folder of empty files to list. Made once and used again by later runs.
+struct Tree {
+    std::string path;
+    std::uint64_t folders = 0;  // below `path`; 0: the files lie in it directly
+    std::uint64_t files = 0;
+    bool hasAttributes = false;  // three a file: last-used date, tags, favourite rank
+    [[nodiscard]] std::uint64_t entries() const { return folders + files; }
+};
+
+// The sizes of a run.
+struct Sizes {
+    std::uint64_t folders;
+    std::uint64_t files;
+    std::uint64_t manyFolders;
+    std::uint64_t manyFiles;
+    std::uint64_t lookUps;  // identifiers that are looked up
+    int rounds;
+    static constexpr Sizes full() { return {1'000, 100'000, 10'000, 1'000'000, 20'000, 5}; }
+    static constexpr Sizes quick() { return {20, 1'000, 50, 5'000, 500, 1}; }
+};
+
+// Makes the tree where it is not there already in full. Throws std::system_error.
+void makeTree(const Tree& tree);
+
+// The path of the file with that number, counted from 0.
+[[nodiscard]] std::string filePath(const Tree& tree, std::uint64_t number);
+
+}  // namespace marrowdale::benchmarks

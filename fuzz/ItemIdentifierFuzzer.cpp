@@ -1,0 +1,52 @@
+// Whatever the text of an identifier is, resolving it ends, and never in a document that the text
+// does not name.
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <string_view>
+
+#include "platform/foundation/FatalError.h"
+#include "platform/testing/FakePlatform.h"
+#include "providers/marrowdale/ItemForIdentifier.h"
+#include "providers/marrowdale/MRFileObjectIdentifier.h"
+
+namespace {
+
+// Knows every document by the number of its file.
+class EveryDocument : public marrowdale::GenerationStore {
+  public:
+    marrowdale::Expected<marrowdale::FileID> resolveDocumentID(
+        marrowdale::DocumentID document, marrowdale::DeviceID /*device*/) override {
+        return marrowdale::FileID{raw(document)};
+    }
+    marrowdale::Expected<marrowdale::DocumentID> getOrAllocateDocumentID(
+        const marrowdale::OpenFile& /*file*/) override {
+        return marrowdale::DocumentID{1};
+    }
+};
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* bytes, std::size_t size) {
+    const std::string text(bytes, bytes + size);
+    marrowdale::FakePlatform fake;
+    EveryDocument documents;
+    fake.fileSystem.pathAnswer = [](marrowdale::DeviceID, marrowdale::FileID file) {
+        return marrowdale::Expected<std::string>("/storage/" + std::to_string(raw(file)));
+    };
+    const marrowdale::Platform platform{fake.log,          fake.fileSystem, fake.attributes,
+                                        fake.writeAccess,  documents,       fake.events,
+                                        fake.applications, fake.manager,    fake.shared};
+    const auto url = marrowdale::fileURLWithItemIdentifier(platform, text);
+    if (url && text.starts_with("did=")) {
+        // The number in the place is the one in the text, with nothing cut off its front.
+        const std::string number(url->lastPathComponent());
+        const auto digits = text.find_first_of("123456789");
+        if (digits == std::string::npos || text.compare(digits, number.size(), number) != 0) {
+            marrowdale::fatalError("resolved to another document");
+        }
+    }
+    (void)marrowdale::itemForIdentifierString(platform, text);
+    return 0;
+}

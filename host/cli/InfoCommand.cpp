@@ -1,0 +1,32 @@
+#include "host/cli/InfoCommand.h"
+
+#include <CLI/App.hpp>
+
+#include "host/cli/ItemJson.h"
+
+namespace marrowdale::host {
+
+void InfoCommand::declareArguments(CLI::App& arguments) {
+    arguments.add_option("ITEM", item_, "A path, a word, or an identifier")->required();
+}
+
+Outcome InfoCommand::run(CommandContext& context) {
+    const auto resolved = context.resolve(ItemArgument(item_));
+    if (!resolved) {
+        return std::unexpected(resolved.error());
+    }
+    const auto item = resolved->requests.item(resolved->identifier);
+    if (!item) {
+        return std::unexpected(Failure::provider(item.error()));
+    }
+    if (context.json()) {
+        JsonWriter writer;
+        appendItem(writer, **item);
+        context.output().writeLine(writer.take());
+    } else {
+        context.output().write(itemDetails(**item));
+    }
+    return {};
+}
+
+}  // namespace marrowdale::host

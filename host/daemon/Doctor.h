@@ -1,0 +1,47 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "host/daemon/Environment.h"
+#include "host/daemon/Settings.h"
+#include "platform/linux/store/StoreReport.h"
+
+namespace marrowdale::host {
+
+enum class FindingStatus : std::uint8_t {
+    ok,
+    note,     // works, but costs something or is switched off
+    problem,  // does not work
+};
+
+// "ok", "note", "problem".
+[[nodiscard]] std::string_view statusName(FindingStatus status);
+
+// One thing that a look at the machine brought. Texts may hold any bytes of paths.
+struct Finding {
+    std::string name;  // stable, for machines
+    FindingStatus status = FindingStatus::ok;
+    std::string message;
+    std::string advice;  // what to do about it; empty where there is nothing to do
+};
+
+// The findings below change nothing on the machine.
+
+// What can be said of a storage root without opening its store.
+[[nodiscard]] std::vector<Finding> rootFindings(const std::string& rootPath);
+
+// What can be said of the folder of the state; the root's path may be empty when there is none.
+[[nodiscard]] Finding stateFinding(const std::string& stateFolder, const std::string& rootPath);
+
+// What can be said of the machine, whatever it serves.
+[[nodiscard]] std::vector<Finding> machineFindings(const Environment& environment);
+
+// What the store tells of itself and of the last look at the tree. `mounts`: what is mounted below
+// the root, by the kernel's table, which has mounts of the root's own file system too.
+[[nodiscard]] std::vector<Finding> storeFindings(const native::StoreReport& report,
+                                                 const std::vector<std::string>& mounts);
+
+}  // namespace marrowdale::host

@@ -1,0 +1,173 @@
+#include "host/daemon/World.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <string_view>
+#include <utility>
+
+#include "host/daemon/ExtensionModule.h"
+#include "host/daemon/HostManager.h"
+#include "platform/Platform.h"
+#include "platform/linux/applications/NoApplications.h"
+#include "platform/linux/files/LinuxExtendedAttributes.h"
+#include "platform/linux/files/LinuxFileSystem.h"
+#include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/store/Store.h"
+
+namespace marrowdale::host {
+
+// Members in the order in which they need each other; they go in the reverse order.
+class World::Parts {
+  public:
+    Parts(WorldOptions options, std::unique_ptr<Log> log, std::unique_ptr<native::Store> store)
+        : options_(std::move(options)),
+          log_(std::move(log)),
+          store_(std::move(store)),
+          trees_({options_.settings.rootPath},
+                 {options_.settings.stateFolder, options_.settings.cacheFolder}),
+          fileSystem_({.documents = *store_,
+                       .types = types_,
+                       .packages = packages_,
+                       .attributes = attributeCache_,
+                       .calls = attributeCalls_,
+                       .trees = trees_,
+                       .work = sharedWork_}),
+          extendedAttributes_(attributeCalls_, trees_),
+          writeAccess_(trees_),
+          manager_(options_.settings.rootPath),
+          platform_{.log = *log_,
+                    .fileSystem = fileSystem_,
+                    .extendedAttributes = extendedAttributes_,
+                    .writeAccess = writeAccess_,
+                    .generationStore = *store_,
+                    .fileEvents = *store_,
+                    .applications = applications_,
+                    .manager = manager_,
+                    .shared = shared_} {}
+
+    ~Parts() {
+        // Handlers refer to the extension.
+        manager_.finishHandlers();
+        requests_.reset();
+        extension_.reset();
+    }
+    Parts(const Parts&) = delete;
+    Parts& operator=(const Parts&) = delete;
+
+    [[nodiscard]] Started<void> loadExtension() {
+        auto module = ExtensionModule::load(options_.modulePath);
+        if (!module) {
+            return std::unexpected(std::move(module.error()));
+        }
+        module_ = std::move(*module);
+        auto extension = module_->makeExtension(platform_);
+        if (!extension) {
+            return std::unexpected(std::move(extension.error()));
+        }
+        extension_ = std::move(*extension);
+        requests_.emplace(*extension_);
+        return {};
+    }
+
+    [[nodiscard]] const ItemRequests& requests() const { return *requests_; }
+    [[nodiscard]] const Settings& settings() const { return options_.settings; }
+    [[nodiscard]] const native::Store& store() const { return *store_; }
+
+  private:
+    WorldOptions options_;
+    std::unique_ptr<Log> log_;
+    std::unique_ptr<native::Store> store_;
+    native::ServedTrees trees_;  // after the store, which makes the folders that are kept out
+    native::MimeTypes types_;
+    native::PackageTypes packages_;
+    native::AttributeCache attributeCache_;
+    native::AttributeCalls attributeCalls_;
+    native::SharedWork sharedWork_;
+    native::LinuxFileSystem fileSystem_;
+    native::LinuxExtendedAttributes extendedAttributes_;
+    native::LinuxWriteAccess writeAccess_;
+    native::NoApplications applications_;
+    HostManager manager_;
+    std::unique_ptr<ExtensionModule> module_;
+    // Holds objects of the extension's, whose code is in the module.
+    SharedObjects shared_;
+    Platform platform_;
+    std::unique_ptr<FileProviderExtension> extension_;
+    std::optional<ItemRequests> requests_;
+};
+
+World::World(std::unique_ptr<Parts> parts) : parts_(std::move(parts)) {}
+
+World::~World() = default;
+
+namespace {
+
+bool isHeldByAnother(const Error& error) {
+    return error.domain == ErrorDomain::posix && error.code == EWOULDBLOCK;
+}
+
+// "process 12"; the store's error tells the number where there is one.
+std::string holder(const Error& error) {
+    const std::string_view subject = error.subject;
+    constexpr std::string_view words = "process ";
+    const auto at = subject.rfind(words);
+    const auto number = at == std::string_view::npos ? "" : subject.substr(at + words.size());
+    const auto digits = number.substr(0, number.find_first_not_of("0123456789"));
+    return digits.empty() ? "another process" : std::string(words) + std::string(digits);
+}
+
+Expected<std::unique_ptr<native::Store>> openStore(const WorldOptions& options, Log& log) {
+    native::StoreOptions store{.stateFolder = options.settings.stateFolder,
+                               .cacheFolder = options.settings.cacheFolder,
+                               .rootPath = options.settings.rootPath,
+                               .lockWait = std::min(options.quietWait, options.lockWait),
+                               .log = &log};
+    auto opened = native::Store::open(store);
+    if (opened || !isHeldByAnother(opened.error()) || options.quietWait >= options.lockWait) {
+        return opened;
+    }
+    if (options.tellWaiting) {
+        options.tellWaiting("waiting for " + holder(opened.error()) +
+                            ", which has the state folder");
+    }
+    store.lockWait = options.lockWait - options.quietWait;
+    return native::Store::open(store);
+}
+
+StartFailure openingFailed(Error error, const Settings& settings) {
+    if (!isHeldByAnother(error)) {
+        return StartFailure::from(std::move(error));
+    }
+    std::string message = holder(error) + " has the state folder " + settings.stateFolder +
+                          "; try again when it has ended";
+    return {std::move(error), std::move(message)};
+}
+
+}  // namespace
+
+Started<std::unique_ptr<World>> World::open(const WorldOptions& options) {
+    auto log = std::make_unique<Log>(options.logSink, options.logThreshold);
+    auto store = openStore(options, *log);
+    if (!store) {
+        return std::unexpected(openingFailed(std::move(store.error()), options.settings));
+    }
+    auto parts = std::make_unique<Parts>(options, std::move(log), std::move(*store));
+    if (auto loaded = parts->loadExtension(); !loaded) {
+        return std::unexpected(std::move(loaded.error()));
+    }
+    return std::unique_ptr<World>(new World(std::move(parts)));
+}
+
+const ItemRequests& World::requests() const {
+    return parts_->requests();
+}
+
+const Settings& World::settings() const {
+    return parts_->settings();
+}
+
+native::StoreReport World::storeReport() const {
+    return parts_->store().report();
+}
+
+}  // namespace marrowdale::host

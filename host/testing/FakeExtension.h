@@ -1,0 +1,125 @@
+#pragma once
+
+#include <map>
+#include <memory>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "platform/hostframework/FileProviderConstants.h"
+#include "platform/hostframework/FileProviderExtension.h"
+
+namespace marrowdale::host {
+
+// An item that is what a test says it is.
+class FakeItem final : public FileProviderItem {
+  public:
+    explicit FakeItem(std::string_view identifier, std::string_view path = "/root/item")
+        : FileProviderItem(URL::fileURL(path)) {
+        itemIdentifier = identifier;
+        filename = fileURL.lastPathComponent();
+    }
+    bool folder = false;
+    bool container = false;
+    [[nodiscard]] bool hx_isContainer() const override { return container; }
+    [[nodiscard]] bool isFolder() const override { return folder; }
+    [[nodiscard]] std::string description() const override { return itemIdentifier; }
+};
+
+// What one request for a page is answered with.
+struct FakeAnswer {
+    std::vector<std::string> identifiers;
+    std::optional<Data> nextPage;
+    std::optional<Error> error;  // wins over the rest
+};
+
+// Answers one page after the other from a list, and remembers which pages were asked for.
+class FakeEnumerator final : public FileProviderEnumerator {
+  public:
+    struct Record {
+        std::vector<Data> pages;
+        bool isInvalidated = false;
+    };
+    FakeEnumerator(std::vector<FakeAnswer> answers, Record& record)
+        : answers_(std::move(answers)), record_(record) {}
+
+    void enumerateItemsForObserver(FileProviderEnumerationObserver& observer,
+                                   const Data& page) override {
+        const FakeAnswer& answer = answers_.at(record_.pages.size());
+        record_.pages.push_back(page);
+        if (answer.error) {
+            observer.finishEnumeratingWithError(*answer.error);
+            return;
+        }
+        std::vector<FileProviderItemPtr> items;
+        for (const std::string& identifier : answer.identifiers) {
+            items.push_back(std::make_shared<FakeItem>(identifier));
+        }
+        observer.didEnumerateItems(std::move(items));
+        observer.finishEnumeratingUpToPage(answer.nextPage);
+    }
+    void currentSyncAnchorWithCompletionHandler(
+        const std::function<void(const std::optional<Data>&)>& completionHandler) override {
+        completionHandler(std::nullopt);
+    }
+    void invalidate() override { record_.isInvalidated = true; }
+
+  private:
+    std::vector<FakeAnswer> answers_;
+    Record& record_;
+};
+
+// An extension that knows the items a test gave it.
+class FakeExtension final : public FileProviderExtension {
+  public:
+    std::map<std::string, std::shared_ptr<FakeItem>, std::less<>> items;
+    std::vector<std::string> askedPaths;
+    std::vector<std::string> enumerated;
+    FakeEnumerator::Record record;
+
+    FakeItem& add(std::string_view identifier, std::string_view path) {
+        auto item = std::make_shared<FakeItem>(identifier, path);
+        items[std::string(identifier)] = item;
+        return *item;
+    }
+
+    [[nodiscard]] std::optional<URL> URLForItemWithPersistentIdentifier(
+        std::string_view itemIdentifier) override {
+        const auto found = items.find(itemIdentifier);
+        return found == items.end() ? std::nullopt : std::optional(found->second->fileURL);
+    }
+    [[nodiscard]] std::optional<std::string> persistentIdentifierForItemAtURL(
+        const URL& url) override {
+        askedPaths.push_back(url.path());
+        for (const auto& [identifier, item] : items) {
+            if (item->fileURL == url) {
+                return identifier;
+            }
+        }
+        return std::nullopt;
+    }
+    [[nodiscard]] Expected<FileProviderItemPtr> itemForIdentifier(
+        std::string_view itemIdentifier) override {
+        const auto found = items.find(itemIdentifier);
+        if (found == items.end()) {
+            return Unexpected(errorForNonExistentItem(itemIdentifier));
+        }
+        return FileProviderItemPtr(found->second);
+    }
+    [[nodiscard]] Expected<std::unique_ptr<FileProviderEnumerator>>
+    enumeratorForContainerItemIdentifier(std::string_view containerItemIdentifier) override {
+        enumerated.emplace_back(containerItemIdentifier);
+        return std::unique_ptr<FileProviderEnumerator>(
+            std::make_unique<FakeEnumerator>(std::vector<FakeAnswer>{}, record));
+    }
+    void providePlaceholderAtURL(const URL& /*url*/, CompletionHandler handler) override {
+        handler({});
+    }
+    void startProvidingItemAtURL(const URL& /*url*/, CompletionHandler handler) override {
+        handler({});
+    }
+    void stopProvidingItemAtURL(const URL& /*url*/) override {}
+    void itemChangedAtURL(const URL& /*url*/) override {}
+};
+
+}  // namespace marrowdale::host

@@ -1,0 +1,62 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "platform/foundation/Error.h"
+#include "platform/foundation/URL.h"
+#include "platform/linux/files/EntryStatus.h"
+#include "platform/linux/files/ServedTrees.h"
+#include "platform/linux/files/UniqueFD.h"
+
+namespace marrowdale::native {
+
+// An item's path in the form that system calls take: an open folder and a name in it.
+//
+// In a served tree the folder is the one the item is in, reached without leaving the tree; what
+// stands there and is not served (another device, something mounted, a private folder, anything
+// behind a link) is not there: ENOENT. Errors carry the URL's path. Outside, links above the item
+// are followed; for paths that one call can take the folder is AT_FDCWD and the name the whole
+// path, longer ones have their folder opened.
+class Place {
+  public:
+    // EINVAL for a URL that is no file URL. Must not outlive the trees.
+    [[nodiscard]] static Expected<Place> of(const URL& url, const ServedTrees& trees);
+
+    [[nodiscard]] int directory() const { return directory_; }
+    // "." for the root of a served tree.
+    [[nodiscard]] const char* name() const { return name_.c_str(); }
+    [[nodiscard]] bool isServed() const { return device_.has_value(); }
+    // Whether `directory` is the folder that the item is in.
+    [[nodiscard]] bool hasParent() const;
+
+    // Looks at the item itself. Calls that take `directory` and `name` only come after it.
+    [[nodiscard]] Expected<EntryStatus> look() const;
+    // Opens the item itself with these flags and O_NOFOLLOW | O_CLOEXEC | O_NOCTTY.
+    [[nodiscard]] Expected<UniqueFD> open(int flags) const;
+    // Opens the item as a folder for reading; the folder's status with it.
+    struct OpenedFolder {
+        UniqueFD descriptor;
+        EntryStatus status;
+    };
+    [[nodiscard]] Expected<OpenedFolder> openFolder() const;
+
+  private:
+    Place(const URL& url, const ServedTrees& trees, std::string name);
+
+    [[nodiscard]] static Expected<Place> outside(const URL& url, const ServedTrees& trees);
+    [[nodiscard]] static Expected<Place> inside(const URL& url,
+                                                const ServedTrees::Location& location,
+                                                const ServedTrees& trees);
+    [[nodiscard]] Expected<EntryStatus> checked(const Expected<EntryStatus>& status) const;
+    [[nodiscard]] bool isRoot() const { return isServed() && name_ == "."; }
+
+    URL url_;
+    const ServedTrees& trees_;
+    std::optional<DeviceID> device_;  // of the served tree
+    UniqueFD folder_;                 // unless the folder is a root, or none
+    int directory_;
+    std::string name_;
+};
+
+}  // namespace marrowdale::native

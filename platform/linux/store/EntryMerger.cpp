@@ -1,0 +1,135 @@
+#include "platform/linux/store/EntryMerger.h"
+
+#include <algorithm>
+#include <limits>
+
+namespace marrowdale::native {
+
+namespace {
+
+// A change within the file system's clock tick of an earlier look may not show in the ctime.
+constexpr std::int64_t unsureNanoseconds = 10'000'000;
+
+bool isUnsure(const Date& changed, const Date& lookedAt) {
+    const std::int64_t seconds = lookedAt.seconds - changed.seconds;
+    if (seconds > 1) {
+        return false;
+    }
+    // The future is unsure too: clocks are set back.
+    return seconds < 0 || seconds * 1'000'000'000 + lookedAt.nanoseconds -
+                                  static_cast<std::int64_t>(changed.nanoseconds) <
+                              unsureNanoseconds;
+}
+
+}  // namespace
+
+bool EntryMerger::isUnchanged(const Row& row, const EntryStatus& status) {
+    return row.fileID == raw(status.fileID) && row.changed == rowTime(status.changed) &&
+           !row.has(Row::unsure) && row.birth == rowBirth(status) && row.kind() == rowKind(status);
+}
+
+bool EntryMerger::isSameFile(const Row& row, const EntryLook& look, bool samePlace) {
+    if (row.fileID != raw(look.status.fileID) || row.kind() != rowKind(look.status)) {
+        return false;
+    }
+    const std::int64_t birth = rowBirth(look.status);
+    const bool bothBirths = row.birth != 0 && birth != 0;
+    const bool bothHandles = row.fingerprint != 0 && look.fingerprint != 0;
+    if ((bothBirths && row.birth != birth) ||
+        (bothHandles && row.fingerprint != look.fingerprint)) {
+        return false;
+    }
+    return bothBirths || bothHandles || samePlace;
+}
+
+Row EntryMerger::valuesOf(const EntryLook& look) {
+    Row values{};
+    values.fileID = raw(look.status.fileID);
+    values.birth = rowBirth(look.status);
+    values.changed = rowTime(look.status.changed);
+    values.size = look.status.isDirectory() ? 0 : look.status.size;
+    values.fingerprint = look.fingerprint;
+    values.flags = static_cast<std::uint32_t>(rowKind(look.status));
+    values.set(Row::unsure, isUnsure(look.status.changed, look.lookedAt));
+    values.set(Row::severalLinks, !look.status.isDirectory() && look.status.linkCount > 1);
+    return values;
+}
+
+RowNumber EntryMerger::unchangedRow(RowNumber folder, std::string_view name,
+                                    const EntryStatus& status, RowNumber guess) const {
+    RowNumber found = guess;
+    if (guess == noRow || index_.row(guess).parent != folder || index_.name(guess) != name) {
+        found = index_.child(folder, name);
+    }
+    return found != noRow && isUnchanged(index_.row(found), status) ? found : noRow;
+}
+
+EntryMerger::Kin EntryMerger::findKin(const EntryLook& look, RowNumber except) const {
+    Kin kin;
+    for (const RowNumber number : index_.rowsOfFile(raw(look.status.fileID))) {
+        const Row& row = index_.row(number);
+        if (number == except || !isSameFile(row, look, false)) {
+            continue;
+        }
+        kin.nextAge = std::max(kin.nextAge, row.age() + 1);
+        kin.document = row.document != 0 ? row.document : kin.document;
+        if (kin.row == noRow || row.has(Row::limbo)) {
+            kin.row = number;
+        }
+    }
+    return kin;
+}
+
+void EntryMerger::refresh(RowNumber number, const EntryLook& look) {
+    const Row& row = index_.row(number);
+    Row values = valuesOf(look);
+    values.setAge(row.age());
+    values.set(Row::unreadable, row.has(Row::unreadable));
+    values.fingerprint = look.fingerprint != 0 ? look.fingerprint : row.fingerprint;
+    const bool sameSize = row.isFolder() || row.size == values.size;
+    if (row.changed != values.changed || row.fingerprint != values.fingerprint || !sameSize ||
+        (row.flags & Row::lastingFlags) != values.flags) {
+        index_.update(number, values);
+    }
+}
+
+RowNumber EntryMerger::addName(RowNumber folder, std::string_view name, const EntryLook& look,
+                               const Kin& kin) {
+    Row values = valuesOf(look);
+    values.setAge(kin.nextAge);
+    const RowNumber added = index_.add(folder, name, values);
+    if (added != noRow && kin.document != 0) {
+        index_.setDocument(added, kin.document);
+    }
+    return added;
+}
+
+RowNumber EntryMerger::merge(RowNumber folder, std::string_view name, const EntryLook& look) {
+    const RowNumber current = index_.child(folder, name);
+    if (current != noRow && isSameFile(index_.row(current), look, true)) {
+        refresh(current, look);
+        return current;
+    }
+    const Kin kin = findKin(look, current);
+    if (kin.row != noRow && look.status.isDirectory() && index_.isWithin(folder, kin.row)) {
+        return noRow;
+    }
+    if (current != noRow) {
+        index_.putInLimbo(current);
+    }
+    const bool isInLimbo = kin.row != noRow && index_.row(kin.row).has(Row::limbo);
+    const bool hasOneName = look.status.isDirectory() || look.status.linkCount <= 1;
+    if (kin.row == noRow || kin.row == rootRow || (!isInLimbo && !hasOneName)) {
+        return addName(folder, name, look, kin);
+    }
+    if (!isInLimbo) {
+        index_.putInLimbo(kin.row);
+    }
+    if (!index_.place(kin.row, folder, name)) {
+        return noRow;
+    }
+    refresh(kin.row, look);
+    return kin.row;
+}
+
+}  // namespace marrowdale::native

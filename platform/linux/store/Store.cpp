@@ -1,0 +1,60 @@
+#include "platform/linux/store/Store.h"
+
+#include <utility>
+
+#include "platform/linux/store/StoreCore.h"
+
+namespace marrowdale::native {
+
+Store::Store(std::unique_ptr<Core> core) : core_(std::move(core)) {}
+Store::~Store() = default;
+
+Expected<std::unique_ptr<Store>> Store::open(const StoreOptions& options) {
+    auto core = Core::open(options);
+    if (!core) {
+        return Unexpected(core.error());
+    }
+    return std::unique_ptr<Store>(new Store(std::move(*core)));
+}
+
+Expected<void> Store::reconcile() {
+    return core_->reconcile();
+}
+
+StoreReport Store::report() const {
+    return core_->report();
+}
+
+Expected<FileID> Store::resolveDocumentID(DocumentID document, DeviceID device) {
+    return core_->resolveDocumentID(document, device);
+}
+
+Expected<DocumentID> Store::getOrAllocateDocumentID(const OpenFile& file) {
+    return core_->documentOf(file);
+}
+
+Expected<EventID> Store::currentEventID() {
+    return core_->currentEventID();
+}
+
+Expected<UUID> Store::volumeUUID(const URL& url) {
+    return core_->volumeUUID(url);
+}
+
+Expected<void> Store::assignDocumentIDs(std::span<Request> requests) {
+    return core_->assignDocumentIDs(requests);
+}
+
+DocumentID Store::knownDocumentID(const EntryStatus& status) {
+    return core_->knownDocumentID(status);
+}
+
+Expected<std::string> Store::pathForFileID(DeviceID device, FileID file) {
+    return core_->pathForFileID(device, file);
+}
+
+std::uint32_t Store::subfolderCount(FileID folder) {
+    return core_->subfolderCount(folder);
+}
+
+}  // namespace marrowdale::native

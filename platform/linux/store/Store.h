@@ -1,0 +1,74 @@
+#pragma once
+
+#include <memory>
+#include <span>
+#include <string>
+
+#include "platform/linux/files/DocumentIndex.h"
+#include "platform/linux/store/StoreOptions.h"
+#include "platform/linux/store/StoreReport.h"
+#include "platform/services/FileEventService.h"
+#include "platform/services/GenerationStore.h"
+
+namespace marrowdale::native {
+
+// The durable store of one root folder: which entries there are, their document identifiers, and
+// the counter of events. One process at a time has it; within the process any thread may call,
+// several at once. Requests wait while a reconcile runs.
+//
+// Nothing is handed out before it is synced to disk. When the disk refuses (ENOSPC, EIO, …), new
+// identifiers are refused with that error and everything known is still answered; after a failed
+// sync that lasts until the store is opened again.
+class Store final : public GenerationStore, public FileEventService, public DocumentIndex {
+  public:
+    // Takes the lock, loads (or makes) the root folder's store and reconciles it with the disk. It
+    // is the folder that counts, not its path: a folder that was moved keeps its store, another
+    // one at the same path gets its own. A damaged store is set aside and made anew under a new
+    // UUID, and so is one that lies at another place than where it was made, or is older than its
+    // witness: that is no error, and StoreReport::rebuildReason tells.
+    //
+    // Errors, with operation and path: the root is missing, no folder or unreadable (ENOENT,
+    // ENOTDIR, EACCES); the root is the state or cache folder (EINVAL); the state folder can't be
+    // made or written (EACCES, EROFS, ENOSPC, …); the
+    // lock is held by another process at the deadline (EWOULDBLOCK, the subject names the folder
+    // and the holder's process number); the store has a format of a later version (EPROTO; nothing
+    // is touched).
+    [[nodiscard]] static Expected<std::unique_ptr<Store>> open(const StoreOptions& options);
+
+    // Commits what is pending, writes a snapshot where the log has grown long, gives the lock
+    // back.
+    ~Store() override;
+    Store(const Store&) = delete;
+    Store& operator=(const Store&) = delete;
+
+    // Brings the index up to what is on disk, on two threads, and commits the differences. Several
+    // callers at once may be served by one run, which began after each of them called. Errors: the
+    // root can't be read; the differences can't be committed.
+    [[nodiscard]] Expected<void> reconcile();
+
+    [[nodiscard]] StoreReport report() const;
+
+    // GenerationStore. Documents of names that are gone are looked for once (a reconcile) before
+    // the answer is ENOENT; another volume is ENXIO.
+    [[nodiscard]] Expected<FileID> resolveDocumentID(DocumentID document, DeviceID device) override;
+    // The file must be below the root: ENOENT otherwise, ENXIO on another volume.
+    [[nodiscard]] Expected<DocumentID> getOrAllocateDocumentID(const OpenFile& file) override;
+
+    // FileEventService.
+    [[nodiscard]] Expected<EventID> currentEventID() override;
+    [[nodiscard]] Expected<UUID> volumeUUID(const URL& url) override;
+
+    // DocumentIndex. What lies outside the root, or in the state or cache folder, is ENOENT; what
+    // lies behind a mount is ENXIO.
+    [[nodiscard]] Expected<void> assignDocumentIDs(std::span<Request> requests) override;
+    [[nodiscard]] DocumentID knownDocumentID(const EntryStatus& status) override;
+    [[nodiscard]] Expected<std::string> pathForFileID(DeviceID device, FileID file) override;
+    [[nodiscard]] std::uint32_t subfolderCount(FileID folder) override;
+
+  private:
+    class Core;
+    explicit Store(std::unique_ptr<Core> core);
+    std::unique_ptr<Core> core_;
+};
+
+}  // namespace marrowdale::native

@@ -1,0 +1,324 @@
+// Giving out document identifiers.
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <fcntl.h>
+#include <limits>
+#include <utility>
+
+#include "platform/linux/files/DirectoryReader.h"
+#include "platform/linux/store/StoreCore.h"
+
+namespace marrowdale::native {
+
+Expected<void> Store::Core::assignDocumentIDs(std::span<Request> requests) {
+    std::vector<std::size_t> unknown;
+    auto foldersKnown = fillKnown(requests, unknown);
+    if (foldersKnown) {
+        if (auto allowed = refuseForeign(requests, unknown); !allowed) {
+            return allowed;
+        }
+    }
+    if (foldersKnown && !*foldersKnown) {
+        // A folder made since the last reconcile.
+        if (auto done = reconcileOnce(); !done) {
+            return done;
+        }
+        foldersKnown = fillKnown(requests, unknown);
+    }
+    if (!foldersKnown) {
+        return Unexpected(foldersKnown.error());
+    }
+    if (unknown.empty() && std::ranges::all_of(requests, [](const Request& request) {
+            return request.document != DocumentID{};
+        })) {
+        return {};
+    }
+    const auto looked = lookAtEntries(requests, unknown);
+    if (!looked) {
+        return Unexpected(looked.error());
+    }
+    return giveOut(requests, *looked);
+}
+
+// The way to a folder below the root; none to what does not lie there.
+std::optional<std::string> Store::Core::pathBelowRoot(std::string_view path) const {
+    const std::string_view root = rootPath_ == "/" ? std::string_view() : rootPath_;
+    if (!path.starts_with(root)) {
+        return std::nullopt;
+    }
+    path.remove_prefix(root.size());
+    if (!path.empty() && path.front() != '/') {
+        return std::nullopt;
+    }
+    path.remove_prefix(std::min(path.find_first_not_of('/'), path.size()));
+    return std::string(path);
+}
+
+bool Store::Core::isRoot(const Request& request) const {
+    return request.status.fileID == rootID_ && request.status.device == device_;
+}
+
+// What is never indexed would get a number that never means anything.
+Expected<void> Store::Core::refuseForeign(std::span<const Request> requests,
+                                          std::span<const std::size_t> unknown) const {
+    if (unknown.empty()) {
+        return {};
+    }
+    const auto unindexed = unindexedFolders();
+    for (const std::size_t i : unknown) {
+        const Request& request = requests[i];
+        if (isRoot(request)) {
+            continue;
+        }
+        if (!pathBelowRoot(request.folderPath) || isUnindexed(request, unindexed)) {
+            return Unexpected(errorWithPOSIXCode(ENOENT, "identify", request.name));
+        }
+        if (request.status.isMountPoint) {
+            return Unexpected(errorWithPOSIXCode(ENXIO, "identify", request.name));
+        }
+    }
+    return {};
+}
+
+bool Store::Core::isUnindexed(const Request& request, std::span<const FileID> folders) const {
+    if (std::ranges::find(folders, request.status.fileID) != folders.end()) {
+        return true;
+    }
+    return std::ranges::any_of(std::array{state_.path(), cacheFolder_}, [&](const auto& folder) {
+        return !folder.empty() && request.folderPath.starts_with(folder) &&
+               (request.folderPath.size() == folder.size() ||
+                request.folderPath[folder.size()] == '/');
+    });
+}
+
+// Fills in what is known without a look at the disk; `unknown` are the requests that need one.
+// False when a folder is not known.
+Expected<bool> Store::Core::fillKnown(std::span<Request> requests,
+                                      std::vector<std::size_t>& unknown) {
+    unknown.clear();
+    bool foldersKnown = true;
+    FileID folder{};
+    RowNumber parent = noRow;
+    const MutexLock lock(mutex_);
+    waitUntilIdle();
+    const EntryMerger merger(index_);
+    RowNumber guess = noRow;
+    for (std::size_t i = 0; i < requests.size(); ++i) {
+        Request& request = requests[i];
+        if (request.status.device != device_) {
+            return Unexpected(errorWithPOSIXCode(ENXIO, "identify", request.name));
+        }
+        if (parent == noRow || request.folder != folder) {
+            folder = request.folder;
+            parent = folderRow(folder);
+            guess = noRow;
+        }
+        request.document = {};
+        // The folder that the root lies in has no row.
+        const bool asksForRoot = isRoot(request);
+        foldersKnown = foldersKnown && (asksForRoot || parent != noRow);
+        RowNumber row = asksForRoot ? rootRow : noRow;
+        if (!asksForRoot && parent != noRow) {
+            row = merger.unchangedRow(parent, request.name, request.status, guess);
+        }
+        if (row == noRow) {
+            unknown.push_back(i);
+            continue;
+        }
+        request.document = DocumentID{index_.row(row).document};
+        guess = index_.row(row).next;
+    }
+    return foldersKnown;
+}
+
+// The folder of a request, where it still is the one that the entry was found in; else none.
+// Errors: a mount was put on the way.
+Expected<UniqueFD> Store::Core::folderOf(const Request& request) const {
+    const auto path = pathBelowRoot(request.folderPath);
+    auto folder = path ? openFolderBeneath(root_.get(), *path) : UniqueFD();
+    if (!folder) {
+        return folder.error().code == EXDEV
+                   ? Unexpected(errorWithPOSIXCode(ENXIO, "identify", request.name))
+                   : Expected<UniqueFD>();
+    }
+    const auto status = *folder ? statEntry(folder->get(), "") : Expected<EntryStatus>();
+    const bool isThatFolder =
+        status && status->fileID == request.folder && status->device == device_;
+    return isThatFolder ? std::move(folder) : Expected<UniqueFD>();
+}
+
+void Store::Core::lookAgain(int folder, const Request& request, Looked& looked) const {
+    const std::string name(request.name);
+    const auto fingerprint = handleFingerprint(folder, name.c_str());
+    const auto status = statEntry(folder, name.c_str());
+    if (fingerprint && status && !status->isMountPoint && status->device == device_ &&
+        status->fileID == request.status.fileID && status->birth == request.status.birth) {
+        looked.look.status = *status;
+        looked.look.fingerprint = *fingerprint;
+        looked.stands = true;
+    }
+}
+
+Expected<std::vector<Store::Core::Looked>> Store::Core::lookAtEntries(
+    std::span<const Request> requests, std::span<const std::size_t> unknown) const {
+    std::vector<Looked> all;
+    UniqueFD folder;
+    std::optional<std::string_view> folderPath;
+    for (const std::size_t i : unknown) {
+        const Request& request = requests[i];
+        if (folderPath != request.folderPath) {
+            folderPath = request.folderPath;
+            auto opened = folderOf(request);
+            if (!opened) {
+                return Unexpected(opened.error());
+            }
+            folder = std::move(*opened);
+        }
+        Looked looked{i, {request.status, 0, Date::now()}, false};
+        if (folder) {
+            lookAgain(folder.get(), request, looked);
+        }
+        all.push_back(std::move(looked));
+    }
+    return all;
+}
+
+RowNumber Store::Core::rowOf(const Request& request) {
+    const RowNumber parent = folderRow(request.folder);
+    return parent == noRow ? noRow
+                           : EntryMerger(index_).unchangedRow(parent, request.name, request.status);
+}
+
+// What stands is put into the index at its name. What went meanwhile keeps the row it has, or gets
+// one without a place: if it was only moved, the next reconcile finds it and it keeps its document.
+RowNumber Store::Core::rowOfLook(const Request& request, const Looked& looked) {
+    const RowNumber parent = folderRow(request.folder);
+    if (looked.stands && parent != noRow) {
+        const RowNumber row = EntryMerger(index_).merge(parent, request.name, looked.look);
+        if (row != noRow) {
+            return row;
+        }
+    }
+    for (const RowNumber number : index_.rowsOfFile(raw(request.status.fileID))) {
+        if (EntryMerger::isSameFile(index_.row(number), looked.look, false)) {
+            return number;
+        }
+    }
+    return index_.addInLimbo(request.name, EntryMerger::valuesOf(looked.look));
+}
+
+std::uint32_t Store::Core::documentOfRow(RowNumber number, std::vector<RowNumber>& given) {
+    if (index_.row(number).document != 0) {
+        return index_.row(number).document;
+    }
+    const Row row = index_.row(number);
+    std::vector<RowNumber> names{number};
+    std::uint32_t document = 0;
+    if (row.has(Row::severalLinks)) {
+        for (const RowNumber other : index_.rowsOfFile(row.fileID)) {
+            const Row& otherRow = index_.row(other);
+            if (other != number && otherRow.birth == row.birth &&
+                otherRow.fingerprint == row.fingerprint) {
+                document = otherRow.document != 0 ? otherRow.document : document;
+                names.push_back(other);
+            }
+        }
+    }
+    if (document == 0) {
+        if (lastDocument_ == std::numeric_limits<std::uint32_t>::max()) {
+            return 0;
+        }
+        document = ++lastDocument_;
+    }
+    for (const RowNumber name : names) {
+        if (index_.row(name).document == 0) {
+            index_.setDocument(name, document);
+            given.push_back(name);
+        }
+    }
+    return document;
+}
+
+void Store::Core::takeBack(std::span<const RowNumber> given) {
+    for (const RowNumber number : given) {
+        index_.setDocument(number, 0);
+    }
+}
+
+Expected<void> Store::Core::giveOut(std::span<Request> requests, std::span<const Looked> looked) {
+    const MutexLock lock(mutex_);
+    waitUntilIdle();
+    const std::uint32_t lastBefore = lastDocument_;
+    std::vector<RowNumber> given;
+    auto look = looked.begin();
+    std::optional<Error> failure;
+    for (std::size_t i = 0; i < requests.size() && !failure; ++i) {
+        Request& request = requests[i];
+        const bool wasLookedAt = look != looked.end() && look->request == i;
+        if (request.document != DocumentID{}) {
+            continue;
+        }
+        // A reconcile may have run since the entry was looked up.
+        RowNumber row = wasLookedAt ? rowOfLook(request, *look) : rowOf(request);
+        if (row == noRow) {
+            row = rowOfLook(request, {i, {request.status, 0, Date::now()}, false});
+        }
+        look += wasLookedAt ? 1 : 0;
+        const std::uint32_t document = row == noRow ? 0 : documentOfRow(row, given);
+        if (document == 0) {
+            failure = errorWithPOSIXCode(EOVERFLOW, "give a document identifier to", request.name);
+        }
+        request.document = DocumentID{document};
+    }
+    // Nothing new means nothing to sync: what else changed is committed with the next that is.
+    if (!failure && !given.empty()) {
+        if (auto committed = commit(); !committed) {
+            failure = committed.error();
+        }
+    }
+    if (failure) {
+        takeBack(given);
+        if (!journal_->failure()) {
+            lastDocument_ = lastBefore;
+        }
+        for (Request& request : requests) {
+            request.document = {};
+        }
+        return Unexpected(*failure);
+    }
+    return {};
+}
+
+Expected<DocumentID> Store::Core::documentOf(const OpenFile& file) {
+    const std::string& path = file.url().path();
+    const auto status = statEntry(file.descriptor(), "");
+    if (!status) {
+        return Unexpected(errorWithPOSIXCode(status.error().code, "look at", path));
+    }
+    if (const DocumentID known = knownDocumentID(*status); known != DocumentID{}) {
+        return known;
+    }
+    if (status->device != device_) {
+        return Unexpected(errorWithPOSIXCode(ENXIO, "identify", path));
+    }
+    const std::string prefix = rootPath_ == "/" ? rootPath_ : rootPath_ + "/";
+    if (!path.starts_with(prefix) || path.size() == prefix.size()) {
+        return Unexpected(errorWithPOSIXCode(ENOENT, "identify", path));
+    }
+    const std::size_t slash = path.rfind('/');
+    const std::string folder = slash == 0 ? "/" : path.substr(0, slash);
+    const auto folderStatus = statEntry(AT_FDCWD, folder.c_str());
+    if (!folderStatus) {
+        return Unexpected(errorWithPOSIXCode(folderStatus.error().code, "look at", folder));
+    }
+    Request request{
+        folderStatus->fileID, folder, std::string_view(path).substr(slash + 1), *status, {}};
+    if (auto assigned = assignDocumentIDs(std::span(&request, 1)); !assigned) {
+        return Unexpected(assigned.error());
+    }
+    return request.document;
+}
+
+}  // namespace marrowdale::native

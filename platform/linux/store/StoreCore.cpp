@@ -1,0 +1,298 @@
+#include "platform/linux/store/StoreCore.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <fcntl.h>
+#include <limits>
+#include <utility>
+
+#include "platform/linux/store/DiskCheck.h"
+#include "platform/linux/store/Reconciler.h"
+
+namespace marrowdale::native {
+
+void Store::Core::waitUntilIdle() {
+    while (reconciling_) {
+        idle_.wait(mutex_);
+    }
+}
+
+Expected<void> Store::Core::commit() {
+    auto committed = journal_->commit(index_, lastDocument_);
+    if (committed) {
+        writeError_.reset();
+    } else {
+        writeError_ = committed.error();
+    }
+    return committed;
+}
+
+void Store::Core::writeSnapshotIfLong() {
+    if (!journal_->wantsSnapshot() || journal_->hasChanges(index_, lastDocument_)) {
+        return;
+    }
+    if (auto written = journal_->writeSnapshot(index_); !written) {
+        log("no snapshot could be written: " + written.error().description());
+    }
+}
+
+Expected<void> Store::Core::reconcile() {
+    if (auto done = reconcileOnce(); !done) {
+        return done;
+    }
+    const MutexLock lock(mutex_);
+    waitUntilIdle();
+    return writeError_ ? Unexpected(*writeError_) : Expected<void>();
+}
+
+// A run that began after the caller came serves the caller too.
+Expected<void> Store::Core::reconcileOnce() {
+    {
+        const MutexLock lock(mutex_);
+        const std::uint64_t startedBefore = runsStarted_;
+        waitUntilIdle();
+        if (runsStarted_ > startedBefore) {
+            return lastRunError_ ? Unexpected(*lastRunError_) : Expected<void>();
+        }
+        reconciling_ = true;
+        ++runsStarted_;
+    }
+    auto done = runReconcile();
+    const MutexLock lock(mutex_);
+    lastRunError_ = done ? std::optional<Error>() : done.error();
+    reconciling_ = false;
+    idle_.notify_all();
+    return done;
+}
+
+std::vector<FileID> Store::Core::unindexedFolders() const {
+    std::vector<FileID> folders;
+    for (const std::string& path : {state_.path(), cacheFolder_}) {
+        if (path.empty()) {
+            continue;
+        }
+        const auto status = statEntry(AT_FDCWD, path.c_str());
+        if (status && status->device == device_) {
+            folders.push_back(status->fileID);
+        }
+    }
+    return folders;
+}
+
+Expected<void> Store::Core::runReconcile() {
+    const auto standing = statEntry(AT_FDCWD, rootPath_.c_str());
+    const auto held = statEntry(root_.get(), "");
+    if (!standing || !held || standing->fileID != held->fileID ||
+        standing->device != held->device) {
+        return Unexpected(
+            errorWithPOSIXCode(standing ? ESTALE : standing.error().code, "look at", rootPath_));
+    }
+    auto report =
+        Reconciler(indexForReconciler(), mutex_, root_.get(), rootPath_, unindexedFolders()).run();
+    if (!report) {
+        return Unexpected(report.error());
+    }
+    const MutexLock lock(mutex_);
+    lastReconcile_ = std::move(*report);
+    // Where the disk is full the index is right all the same, and what is known can be answered.
+    (void)commit();
+    return {};
+}
+
+StoreReport Store::Core::report() {
+    StoreReport report;
+    report.stores = state_.stores();
+    const MutexLock lock(mutex_);
+    waitUntilIdle();
+    report.stateFolder = state_.path();
+    report.storeFolder = folder_.store();
+    report.rootPath = rootPath_;
+    report.uuid = identity_.uuid;
+    constexpr std::int64_t billion = 1'000'000'000;
+    report.created = {identity_.created / billion,
+                      static_cast<std::uint32_t>(identity_.created % billion)};
+    report.rebuildReason = identity_.reason;
+    if (statEntry(AT_FDCWD, folder_.damaged().c_str())) {
+        report.damagedFolder = folder_.damaged();
+    }
+    report.witness = journal_->witnessProblem();
+    report.entries = index_.count();
+    report.documents = index_.documentCount();
+    report.memory = index_.memory();
+    report.logBytes = journal_->logBytes();
+    report.snapshotBytes = journal_->snapshotBytes();
+    report.lastEventID = EventID{journal_->lastEvent()};
+    report.documentIDsUsed = lastDocument_ - (identity_.firstDocument - 1);
+    report.documentIDsLeft = std::numeric_limits<std::uint32_t>::max() - lastDocument_;
+    report.writeError = writeError_;
+    report.reconcile = lastReconcile_;
+    return report;
+}
+
+Expected<EventID> Store::Core::currentEventID() {
+    const MutexLock lock(mutex_);
+    waitUntilIdle();
+    if (auto committed = commit(); !committed) {
+        return Unexpected(committed.error());
+    }
+    return EventID{journal_->lastEvent()};
+}
+
+Expected<UUID> Store::Core::volumeUUID(const URL& url) const {
+    const auto status = statEntry(AT_FDCWD, url.path().c_str());
+    if (!status) {
+        return Unexpected(errorWithPOSIXCode(status.error().code, "look at", url.path()));
+    }
+    if (status->device != device_) {
+        return Unexpected(errorWithPOSIXCode(ENXIO, "find the history of", url.path()));
+    }
+    return identity_.uuid;
+}
+
+void Store::Core::addPlace(RowNumber number, std::vector<Place>& places) {
+    Place place;
+    if (index_.path(number, place.path)) {
+        place.row = index_.row(number);
+        places.push_back(std::move(place));
+    }
+}
+
+std::vector<Store::Core::Place> Store::Core::placesOfFile(FileID file) {
+    std::vector<Place> places;
+    const MutexLock lock(mutex_);
+    waitUntilIdle();
+    for (const RowNumber number : index_.rowsOfFile(raw(file))) {
+        addPlace(number, places);
+    }
+    return places;
+}
+
+std::vector<Store::Core::Place> Store::Core::placesOfDocument(DocumentID document, bool& isKnown) {
+    std::vector<Place> places;
+    const MutexLock lock(mutex_);
+    waitUntilIdle();
+    for (const RowNumber number : index_.rowsOfDocument(raw(document))) {
+        isKnown = true;
+        addPlace(number, places);
+    }
+    return places;
+}
+
+// The oldest of the names that stands on disk.
+Expected<std::optional<Store::Core::Place>> Store::Core::standing(
+    std::vector<Place>& places) const {
+    std::ranges::sort(places, {}, [](const Place& place) { return place.row.age(); });
+    std::optional<Error> failure;
+    for (Place& place : places) {
+        const auto stands = standsAt(root_.get(), device_, place.path, place.row);
+        if (stands && *stands) {
+            return std::optional(std::move(place));
+        }
+        if (!stands) {
+            failure = stands.error();
+        }
+    }
+    return failure ? Expected<std::optional<Place>>(Unexpected(*failure))
+                   : Expected<std::optional<Place>>(std::nullopt);
+}
+
+Expected<std::string> Store::Core::pathForFileID(DeviceID device, FileID file) {
+    const std::string subject = "fid=" + std::to_string(raw(file));
+    if (device != device_) {
+        return Unexpected(errorWithPOSIXCode(ENXIO, "find the path of", subject));
+    }
+    if (raw(file) == 0) {
+        return Unexpected(errorWithPOSIXCode(ENOENT, "find the path of", subject));
+    }
+    for (const bool lastTry : {false, true}) {
+        auto places = placesOfFile(file);
+        auto found = standing(places);
+        if (!found) {
+            return Unexpected(found.error());
+        }
+        if (*found) {
+            const std::string& path = (*found)->path;
+            return path.empty() ? rootPath_ : rootPath_ + (rootPath_ == "/" ? "" : "/") + path;
+        }
+        if (!lastTry) {
+            if (auto done = reconcileOnce(); !done) {
+                return Unexpected(done.error());
+            }
+        }
+    }
+    return Unexpected(errorWithPOSIXCode(ENOENT, "find the path of", subject));
+}
+
+Expected<FileID> Store::Core::resolveDocumentID(DocumentID document, DeviceID device) {
+    const std::string subject = "did=" + std::to_string(raw(document));
+    if (device != device_) {
+        return Unexpected(errorWithPOSIXCode(ENXIO, "find the file of", subject));
+    }
+    for (const bool lastTry : {false, true}) {
+        bool isKnown = false;
+        auto places = placesOfDocument(document, isKnown);
+        auto found = standing(places);
+        if (!found) {
+            return Unexpected(found.error());
+        }
+        if (*found) {
+            return FileID{(*found)->row.fileID};
+        }
+        // A document that no row has can't come back by looking at the disk.
+        if (lastTry || !isKnown || raw(document) == 0) {
+            break;
+        }
+        if (auto done = reconcileOnce(); !done) {
+            return Unexpected(done.error());
+        }
+    }
+    return Unexpected(errorWithPOSIXCode(ENOENT, "find the file of", subject));
+}
+
+DocumentID Store::Core::knownDocumentID(const EntryStatus& status) {
+    std::vector<Place> unproven;
+    {
+        const MutexLock lock(mutex_);
+        waitUntilIdle();
+        if (status.device != device_) {
+            return {};
+        }
+        for (const RowNumber number : index_.rowsOfFile(raw(status.fileID))) {
+            const Row& row = index_.row(number);
+            if (row.document != 0 && EntryMerger::isUnchanged(row, status)) {
+                return DocumentID{row.document};
+            }
+            if (row.document != 0 && EntryMerger::isSameFile(row, {status, 0, {}}, true)) {
+                addPlace(number, unproven);
+            }
+        }
+    }
+    // Its ctime moved: only the handle tells whether the inode number is still the same file's.
+    for (const Place& place : unproven) {
+        const auto look = lookBeneath(root_.get(), place.path, place.row);
+        if (look && look->status.changed == status.changed &&
+            EntryMerger::isSameFile(place.row, *look, true)) {
+            return DocumentID{place.row.document};
+        }
+    }
+    return {};
+}
+
+std::uint32_t Store::Core::subfolderCount(FileID folder) {
+    const MutexLock lock(mutex_);
+    waitUntilIdle();
+    const RowNumber number = folderRow(folder);
+    return number == noRow ? 0 : index_.row(number).subfolders();
+}
+
+RowNumber Store::Core::folderRow(FileID folder) {
+    for (const RowNumber number : index_.rowsOfFile(raw(folder))) {
+        const Row& row = index_.row(number);
+        if (row.isFolder() && !row.has(Row::limbo)) {
+            return number;
+        }
+    }
+    return noRow;
+}
+
+}  // namespace marrowdale::native

@@ -1,0 +1,29 @@
+#pragma once
+
+#include <chrono>
+#include <optional>
+#include <string>
+
+#include "platform/foundation/Log.h"
+
+namespace marrowdale::native {
+
+// What a store is opened with. Paths are absolute.
+struct StoreOptions {
+    // Holds the stores of all root folders that were ever opened with it, and one lock. Made (mode
+    // 0700) when missing, with the folders above it. It may lie below the root: then it is never
+    // indexed.
+    std::string stateFolder;
+    // Holds the witness of the last identifiers, which tells a store that was restored from a
+    // back-up. Made when missing; empty for none. A cache folder that can't be written costs that
+    // protection, nothing else (StoreReport::witness says so). Never indexed either.
+    std::string cacheFolder;
+    // The folder whose tree is indexed, canonical (no links in it). Must exist and be a folder.
+    std::string rootPath;
+    // How long to wait while another process has the store. Zero: not at all; no value: for ever.
+    std::optional<std::chrono::milliseconds> lockWait = std::chrono::milliseconds(0);
+    // May be null. Must outlive the store.
+    Log* log = nullptr;
+};
+
+}  // namespace marrowdale::native

@@ -1,0 +1,68 @@
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "platform/foundation/Date.h"
+#include "platform/foundation/Error.h"
+#include "platform/foundation/Identifiers.h"
+#include "platform/foundation/UUID.h"
+
+namespace marrowdale::native {
+
+// What the last reconcile found.
+struct ReconcileReport {
+    Date finished;
+    std::chrono::nanoseconds duration{};
+    std::uint64_t folders = 0;      // that were listed
+    std::uint64_t entries = 0;      // that were looked at
+    std::uint64_t differences = 0;  // rows that were made, changed, moved or removed
+    // Paths, the first 100 of each kind; the counts are whole.
+    std::vector<std::string> unreadableFolders;  // what was known below them is kept
+    std::uint64_t unreadableFolderCount = 0;
+    std::vector<std::string>
+        skippedMounts;  // entries on which something is mounted, and subvolumes
+    std::uint64_t skippedMountCount = 0;
+};
+
+// One of the stores in a state folder.
+struct StoredRoot {
+    std::string folder;    // where it lies
+    std::string rootPath;  // where its root folder stood when it was last opened; empty when that
+                           // can't be read
+    std::uint64_t bytes = 0;
+};
+
+// The state of a store, for people. Sizes in bytes.
+struct StoreReport {
+    std::string stateFolder;
+    std::string storeFolder;
+    std::string rootPath;
+    std::vector<StoredRoot> stores;  // all in the state folder, this one too
+    UUID uuid;
+    Date created;
+    // Why this store was made in place of an earlier one, or beside that of an earlier folder at
+    // the same path; empty when there was none before.
+    std::string rebuildReason;
+    // Where the earlier store was set aside; empty when there is none.
+    std::string damagedFolder;
+    // What stands in the way of the witness; empty when it is kept.
+    std::string witness;
+    std::uint64_t entries = 0;
+    std::uint64_t documents = 0;  // entries that have a document identifier
+    std::uint64_t memory = 0;     // held by the index
+    std::uint64_t logBytes = 0;   // of all segments
+    std::uint64_t snapshotBytes = 0;
+    EventID lastEventID{};
+    std::uint64_t documentIDsUsed = 0;  // given out or skipped, of 2^32 less the start
+    std::uint64_t documentIDsLeft = 0;
+    // The error that ended writing: no new identifiers are given out until the store is opened
+    // again.
+    std::optional<Error> writeError;
+    ReconcileReport reconcile;
+};
+
+}  // namespace marrowdale::native

@@ -1,0 +1,40 @@
+#pragma once
+
+#include <mutex>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "platform/hostframework/FileProviderManager.h"
+
+namespace marrowdale {
+
+// A host that only remembers which containers it was told to read again. Any thread.
+class FakeManager : public FileProviderManager {
+  public:
+    explicit FakeManager(std::string_view storageRoot) : root_(URL::fileURL(storageRoot)) {}
+
+    [[nodiscard]] const URL& documentStorageURL() const override { return root_; }
+    void signalEnumeratorForContainerItemIdentifier(
+        std::string_view containerItemIdentifier,
+        std::function<void(const std::optional<Error>&)> completionHandler) override {
+        {
+            const std::lock_guard lock(mutex_);
+            signalled_.emplace_back(containerItemIdentifier);
+        }
+        if (completionHandler) {
+            completionHandler(std::nullopt);
+        }
+    }
+    [[nodiscard]] std::vector<std::string> signalled() const {
+        const std::lock_guard lock(mutex_);
+        return signalled_;
+    }
+
+  private:
+    URL root_;
+    mutable std::mutex mutex_;
+    std::vector<std::string> signalled_;  // guarded by mutex_
+};
+
+}  // namespace marrowdale

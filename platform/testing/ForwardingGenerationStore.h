@@ -1,0 +1,23 @@
+#pragma once
+
+#include "platform/services/GenerationStore.h"
+
+namespace marrowdale {
+
+// Hands every call on to another store; derive and override what the test is about.
+class ForwardingGenerationStore : public GenerationStore {
+  public:
+    explicit ForwardingGenerationStore(GenerationStore& target) : target_(target) {}
+
+    Expected<FileID> resolveDocumentID(DocumentID document, DeviceID device) override {
+        return target_.resolveDocumentID(document, device);
+    }
+    Expected<DocumentID> getOrAllocateDocumentID(const OpenFile& file) override {
+        return target_.getOrAllocateDocumentID(file);
+    }
+
+  private:
+    GenerationStore& target_;
+};
+
+}  // namespace marrowdale

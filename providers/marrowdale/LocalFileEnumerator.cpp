@@ -1,0 +1,237 @@
+#include "providers/marrowdale/LocalFileEnumerator.h"
+
+#include <memory>
+#include <utility>
+
+#include "platform/foundation/FatalError.h"
+#include "platform/hostframework/FileProviderConstants.h"
+#include "providers/marrowdale/LocalItem.h"
+#include "providers/marrowdale/ParentFolderCache.h"
+#include "providers/marrowdale/ProviderError.h"
+
+namespace marrowdale {
+
+namespace {
+
+constexpr std::string_view trashName = ".Trash";
+
+// The trash shows what was put into it, not what that holds.
+std::optional<DirectoryEnumerationOptions> optionsForRoot(const URL& url) {
+    if (url.lastPathComponent() != trashName) {
+        return std::nullopt;
+    }
+    return DirectoryEnumerationOptions{.skipSubdirectoryDescendants = true,
+                                       .skipPackageDescendants = true,
+                                       .skipHiddenFiles = true};
+}
+
+std::vector<std::string> listedAttributeNames() {
+    return {std::string(LocalItem::xattrLastUsedDateName), std::string(LocalItem::xattrTagDataName),
+            std::string(LocalItem::xattrFavoriteRankName)};
+}
+
+std::string joinedPaths(const std::vector<URL>& urls) {
+    std::string text;
+    for (const URL& url : urls) {
+        text += (text.empty() ? "" : ", ") + url.path();
+    }
+    return text;
+}
+
+std::vector<FileProviderItemPtr> makeItems(const Platform& platform, const std::vector<URL>& urls) {
+    ParentFolderCache parents(platform);
+    const LocalItem::Options options{.customItemID = {},
+                                     .customParentItemID = {},
+                                     .customFilename = {},
+                                     .hasLumenoDomainIdentifier = true,
+                                     .bundleIdentifier = {}};
+    std::vector<FileProviderItemPtr> items;
+    items.reserve(urls.size());
+    for (const URL& url : urls) {
+        if (auto item = LocalItem::initWithURL(platform, url, options, &parents)) {
+            items.push_back(std::move(item));
+        }
+    }
+    return items;
+}
+
+}  // namespace
+
+LocalFileEnumerator::LocalFileEnumerator(const Platform& platform, std::string container,
+                                         std::vector<URL> urls)
+    : platform_(platform), container_(std::move(container)), urls_(std::move(urls)) {
+    if (urls_.empty()) {
+        fatalError("can't create enumerator for an empty list of URLs");
+    }
+}
+
+void LocalFileEnumerator::enumerateItemsForObserver(FileProviderEnumerationObserver& observer,
+                                                    const Data& page) noexcept {
+    std::optional<FSChangeToken> token;
+    std::string label;
+    if (page == VantrelInitialPageSortedByDate()) {
+        label = "initialPageSortedByDate";
+    } else if (page == VantrelInitialPageSortedByName()) {
+        label = "initialPageSortedByName";
+    } else {
+        const auto decoded = FSChangeToken::decode(page);
+        if (!decoded) {
+            platform_.log.error("can't create change token from anchor data, resetting");
+            observer.finishEnumeratingWithError(errorSyncAnchorExpired());
+            return;
+        }
+        token = *decoded;
+        label = token->description();
+    }
+    const LogSection section(
+        platform_.log, [&] { return "enumerate items for " + container_ + " with page " + label; });
+    gatherPhase(observer, token);
+}
+
+void LocalFileEnumerator::currentSyncAnchorWithCompletionHandler(
+    const std::function<void(const std::optional<Data>&)>& completionHandler) noexcept {
+    completionHandler(std::nullopt);
+}
+
+void LocalFileEnumerator::gatherPhase(FileProviderEnumerationObserver& observer,
+                                      const std::optional<FSChangeToken>& token) {
+    const auto start = startOfPage(token);
+    if (!start) {
+        observer.finishEnumeratingWithError(start.error());
+        return;
+    }
+    const FSDirectoryEnumerator request = listingRequest(*start);
+    std::vector<URL> urls;
+    urls.reserve(pageSize);
+    auto result = request.enumerate(platform_, urls, takeRestingWalk(*start));
+    if (!result) {
+        platform_.log.error("can't enumerate " + joinedPaths(request.urls) + "; " +
+                            result.error().description());
+        observer.finishEnumeratingWithError(result.error());
+        return;
+    }
+    platform_.log.debug([&] { return "discovered " + std::to_string(urls.size()) + " items"; });
+    observer.didEnumerateItems(makeItems(platform_, urls));
+    finish(observer, *start, std::move(*result));
+}
+
+Expected<LocalFileEnumerator::Start> LocalFileEnumerator::startOfPage(
+    const std::optional<FSChangeToken>& token) const {
+    const auto deviceUUID = platform_.fileEvents.volumeUUID(urls_.front());
+    if (!deviceUUID) {
+        const std::string& path = urls_.front().path();
+        platform_.log.error("can't get volume UUID for " + path);
+        return Unexpected(errorWithProviderCode(ProviderErrorCode::unableToGetDeviceUUID, path));
+    }
+    if (!token) {
+        platform_.log.debug([] { return "start gather phase"; });
+        const auto eventID = platform_.fileEvents.currentEventID();
+        if (!eventID) {
+            return Unexpected(eventID.error());
+        }
+        return Start{.deviceUUID = *deviceUUID, .streamEventID = *eventID, .offset = 0};
+    }
+    if (token->deviceUUID != *deviceUUID) {
+        platform_.log.debug([&] {
+            return "device UUID changed (" + token->deviceUUID.text() + " -> " +
+                   deviceUUID->text() + ")";
+        });
+        return Unexpected(errorSyncAnchorExpired());
+    }
+    platform_.log.debug(
+        [&] { return "resume gather phase at offset " + std::to_string(token->offset); });
+    return Start{.deviceUUID = *deviceUUID,
+                 .streamEventID = EventID{token->streamEventID},
+                 .offset = token->offset};
+}
+
+FSDirectoryEnumerator LocalFileEnumerator::listingRequest(const Start& start) const {
+    const bool isOrdinary = container_ != VantrelAllDirectoriesContainerItemIdentifier &&
+                            container_ != VantrelWorkingSetContainerItemIdentifier;
+    return {.urls = roots(),
+            .recursively = !isOrdinary,
+            .offset = start.offset,
+            .limit = pageSize,
+            .errorHandler = {},
+            .directoryEnumerationOptionsFor = optionsForRoot,
+            .keys = LocalItem::listingKeys(),
+            .attributeNames = listedAttributeNames(),
+            .startPosition =
+                start.offset == 0 ? std::nullopt : cursors().find(cursorKey(start, start.offset))};
+}
+
+std::vector<URL> LocalFileEnumerator::roots() const {
+    if (container_ == VantrelAllDirectoriesContainerItemIdentifier) {
+        return urls_;
+    }
+    if (container_ != VantrelWorkingSetContainerItemIdentifier) {
+        return {enumeratedItemURL()};
+    }
+    std::vector<URL> trashFolders;
+    trashFolders.reserve(urls_.size());
+    for (const URL& url : urls_) {
+        trashFolders.push_back(url.appendingPathComponent(trashName));
+    }
+    return trashFolders;
+}
+
+FSWalkCursors& LocalFileEnumerator::cursors() const {
+    return platform_.shared.get<FSWalkCursors>("marrowdale.walk-cursors");
+}
+
+FSWalkCursorKey LocalFileEnumerator::cursorKey(const Start& start, std::uint64_t offset) const {
+    std::vector<std::string> paths;
+    for (const URL& url : roots()) {
+        paths.push_back(url.path());
+    }
+    return {.deviceUUID = start.deviceUUID,
+            .streamEventID = raw(start.streamEventID),
+            .offset = offset,
+            .container = container_,
+            .roots = std::move(paths)};
+}
+
+// The walk is only good for the page that follows; any other page begins with a walk of its own.
+std::unique_ptr<DirectoryEnumerator> LocalFileEnumerator::takeRestingWalk(const Start& start) {
+    RestingWalk resting;
+    {
+        const std::lock_guard lock(mutex_);
+        std::swap(resting, resting_);
+    }
+    const bool fits = resting.walk && resting.key == cursorKey(start, start.offset);
+    return fits ? std::move(resting.walk) : nullptr;
+}
+
+void LocalFileEnumerator::letRest(RestingWalk resting) {
+    const std::lock_guard lock(mutex_);
+    std::swap(resting_, resting);
+}
+
+void LocalFileEnumerator::invalidate() noexcept {
+    letRest({});
+}
+
+void LocalFileEnumerator::finish(FileProviderEnumerationObserver& observer, const Start& start,
+                                 FSDirectoryEnumerator::Result result) {
+    // A walk that ended before the page began has advanced by nothing, not by a wrapped number.
+    const bool isFull =
+        result.position >= start.offset && result.position - start.offset == pageSize;
+    if (!isFull) {
+        platform_.log.debug([&] { return "gather phase finished for " + joinedPaths(roots()); });
+        observer.finishEnumeratingUpToPage(std::nullopt);
+        return;
+    }
+    if (result.nextPosition) {
+        FSWalkCursorKey key = cursorKey(start, result.position);
+        cursors().remember(key, std::move(*result.nextPosition));
+        letRest({std::move(key), std::move(result.restingWalk)});
+    }
+    const FSChangeToken next{.version = 0,
+                             .deviceUUID = start.deviceUUID,
+                             .streamEventID = raw(start.streamEventID),
+                             .offset = result.position,
+                             .appLibraryVersionToken = 0};
+    observer.finishEnumeratingUpToPage(next.encode());
+}
+
+}  // namespace marrowdale

@@ -1,0 +1,55 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "platform/Platform.h"
+#include "platform/hostframework/FileProviderExtension.h"
+
+namespace marrowdale {
+
+class LocalItem;
+
+// The object that the host makes and calls: every request enters here. Keeps no state that changes;
+// every look-up builds fresh records.
+class LocalFileProvider : public FileProviderExtension {
+  public:
+    // Asks the host to read the working set again, for what changed while nothing ran. The platform
+    // lives longer than the provider and all that it hands out.
+    explicit LocalFileProvider(const Platform& platform);
+
+    std::optional<URL> URLForItemWithPersistentIdentifier(
+        std::string_view itemIdentifier) noexcept override;
+    std::optional<std::string> persistentIdentifierForItemAtURL(const URL& url) noexcept override;
+    // The host framework's error for an item that does not exist.
+    Expected<FileProviderItemPtr> itemForIdentifier(
+        std::string_view itemIdentifier) noexcept override;
+    Expected<std::unique_ptr<FileProviderEnumerator>> enumeratorForContainerItemIdentifier(
+        std::string_view containerItemIdentifier) noexcept override;
+
+    // Everything is on this device: there is nothing to provide, and nothing to give back.
+    void providePlaceholderAtURL(const URL& url,
+                                 CompletionHandler completionHandler) noexcept override;
+    void startProvidingItemAtURL(const URL& url,
+                                 CompletionHandler completionHandler) noexcept override;
+    void stopProvidingItemAtURL(const URL& url) noexcept override;
+    void itemChangedAtURL(const URL& url) noexcept override;
+
+    // The item at a URL that an action holds. Fails with invalidItemURL when it has no identifier,
+    // with itemNotFound when it has one and can't be served.
+    [[nodiscard]] Expected<FileProviderItemPtr> itemForURL(const URL& url);
+
+    // The two look-ups without their log sections, for use within other requests.
+    [[nodiscard]] Expected<URL> _urlForItemWithPersistentIdentifier(
+        std::string_view itemIdentifier);
+    [[nodiscard]] std::optional<std::string> _persistentIdentifierForItemAt(const URL& url);
+
+  private:
+    [[nodiscard]] Expected<FileProviderItemPtr> lookUpItem(std::string_view itemIdentifier);
+
+    const Platform& platform_;
+};
+
+}  // namespace marrowdale

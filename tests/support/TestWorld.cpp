@@ -1,0 +1,47 @@
+#include "tests/support/TestWorld.h"
+
+#include <stdexcept>
+#include <utility>
+
+#include "platform/testing/TestFiles.h"
+
+namespace marrowdale {
+
+namespace {
+
+std::string madeRoot(const TemporaryDirectory& directory) {
+    std::string root = directory.path("Documents");
+    makeFolder(root);
+    return root;
+}
+
+std::unique_ptr<native::Store> openedStore(const TemporaryDirectory& directory,
+                                           const std::string& rootPath, Log& log) {
+    native::StoreOptions options;
+    options.stateFolder = directory.path("state");
+    options.cacheFolder = directory.path("cache");
+    options.rootPath = rootPath;
+    options.log = &log;
+    auto store = native::Store::open(options);
+    if (!store) {
+        throw std::runtime_error(store.error().description());
+    }
+    return std::move(*store);
+}
+
+}  // namespace
+
+TestWorld::TestWorld(const TemporaryDirectory& directory)
+    : rootPath_(madeRoot(directory)),
+      store(openedStore(directory, rootPath_, log)),
+      trees({rootPath_}, {directory.path("state"), directory.path("cache")}),
+      realFileSystem(native::FileSources{.documents = *store,
+                                         .types = types_,
+                                         .packages = packages_,
+                                         .attributes = attributeCache_,
+                                         .calls = attributeCalls_,
+                                         .trees = trees,
+                                         .work = sharedWork_}),
+      manager(rootPath_) {}
+
+}  // namespace marrowdale

@@ -1,0 +1,69 @@
+#pragma once
+
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include "platform/Platform.h"
+#include "platform/linux/files/AttributeCache.h"
+#include "platform/linux/files/AttributeCalls.h"
+#include "platform/linux/files/LinuxExtendedAttributes.h"
+#include "platform/linux/files/LinuxFileSystem.h"
+#include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/files/MimeTypes.h"
+#include "platform/linux/files/PackageTypes.h"
+#include "platform/linux/store/Store.h"
+#include "platform/testing/FakeApplicationRegistry.h"
+#include "platform/testing/FakeManager.h"
+#include "platform/testing/FaultInjectingFileSystem.h"
+#include "platform/testing/RecordingLogSink.h"
+#include "platform/testing/TemporaryDirectory.h"
+
+namespace marrowdale {
+
+// A whole world on real folders: the storage root "Documents" in a temporary directory, the store's
+// state in "state" beside it, the real file system and store over them; a host and an application
+// registry that a test decides about, and a log that remembers. Where a fault can't be provoked, a
+// test puts it into `fileSystem`.
+//
+// A second world on the same directory, after the first is gone, is what a new process finds.
+class TestWorld {
+  public:
+    // Makes the storage root when it is missing. `directory` lives longer. Throws
+    // std::runtime_error where the store can't be opened.
+    explicit TestWorld(const TemporaryDirectory& directory);
+    TestWorld(const TestWorld&) = delete;
+    TestWorld& operator=(const TestWorld&) = delete;
+
+    // The storage root's path, and that of something in it.
+    [[nodiscard]] const std::string& root() const { return manager.documentStorageURL().path(); }
+    [[nodiscard]] std::string path(std::string_view name) const {
+        return root() + "/" + std::string(name);
+    }
+    [[nodiscard]] URL url(std::string_view name) const { return URL::fileURL(path(name)); }
+
+  private:
+    const std::string rootPath_;
+    native::MimeTypes types_;
+    native::PackageTypes packages_;
+    native::AttributeCache attributeCache_;
+    native::AttributeCalls attributeCalls_;
+    native::SharedWork sharedWork_;
+
+  public:
+    const std::shared_ptr<RecordingLogSink> sink = std::make_shared<RecordingLogSink>();
+    Log log{sink, LogLevel::debug};
+    const std::unique_ptr<native::Store> store;
+    const native::ServedTrees trees;
+    native::LinuxFileSystem realFileSystem;
+    FaultInjectingFileSystem fileSystem{realFileSystem};
+    native::LinuxExtendedAttributes attributes{attributeCalls_, trees};
+    native::LinuxWriteAccess writeAccess{trees};
+    FakeApplicationRegistry applications;
+    FakeManager manager;
+    SharedObjects shared;
+    const Platform platform{log,    fileSystem,   attributes, writeAccess, *store,
+                            *store, applications, manager,    shared};
+};
+
+}  // namespace marrowdale
