@@ -37,6 +37,7 @@ TEST_P(StoreTest, GivesEveryEntryADocumentAndFindsItAgain) {
 TEST_P(StoreTest, IdentifiersSurviveARestart) {
     write("a");
     write("folder/b");
+    settle();
     open();
     const auto a = assign("").at("a");
     const auto b = assign("folder").at("b");
