@@ -32,7 +32,11 @@ LAYERS = {
     "providers/marrowdale/fs": INTERFACES,
     "providers/marrowdale": INTERFACES + EXTENSION,
     "platform/linux/files": ["platform/foundation", "platform/services"],
-    "platform/linux/store": ["platform/foundation", "platform/services"] + FILES,
+    "platform/linux/events": ["platform/foundation", "platform/services"] + FILES,
+    "platform/linux/store": ["platform/foundation", "platform/services"] + FILES
+                            + ["platform/linux/events"],
+    "platform/linux/streams": ["platform/foundation", "platform/services"] + FILES
+                              + ["platform/linux/store"],
     "platform/linux/applications": ["platform/foundation", "platform/services"] + FILES,
     # The module is reached through its entry point, so the host knows the extension's interfaces
     # and never its classes. The codes of its errors are part of what it answers.

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <memory>
 #include <optional>
 
 #include "platform/services/FileEventService.h"
@@ -25,6 +26,9 @@ class FakeFileEventService : public FileEventService {
             return Unexpected(*uuidError);
         }
         return uuid;
+    }
+    std::unique_ptr<FileEventStream> makeStream(FileEventStreamRequest /*request*/) override {
+        return nullptr;
     }
 };
 

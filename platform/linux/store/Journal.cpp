@@ -69,19 +69,20 @@ Expected<void> putDirtyRows(FrameStream& out, const Index& index) {
 
 }  // namespace
 
-bool Journal::hasChanges(const Index& index, std::uint32_t lastDocument) const {
-    return gapIsNew_ || !index.dirty().empty() || lastDocument != lastDocument_;
+bool Journal::hasChanges(const Index& index, const EventBatch& events,
+                         std::uint32_t lastDocument) const {
+    return gapIsNew_ || !index.dirty().empty() || !events.empty() || lastDocument != lastDocument_;
 }
 
-Expected<void> Journal::commit(Index& index, std::uint32_t lastDocument) {
-    if (!hasChanges(index, lastDocument)) {
+Expected<void> Journal::commit(Index& index, EventBatch& events, std::uint32_t lastDocument) {
+    if (!hasChanges(index, events, lastDocument)) {
         return {};
     }
     if (failure_) {
         return Unexpected(*failure_);
     }
-    const std::uint64_t events = index.dirty().size() + (gapIsNew_ ? 1U : 0U);
-    if (auto reserved = range_.reserve(lastEvent_ + events, lastDocument); !reserved) {
+    const std::uint64_t count = index.dirty().size() + (gapIsNew_ ? 1U : 0U);
+    if (auto reserved = range_.reserve(lastEvent_ + count, lastDocument); !reserved) {
         return reserved;
     }
     if (writer_.offset() > segmentLimit) {
@@ -89,15 +90,17 @@ Expected<void> Journal::commit(Index& index, std::uint32_t lastDocument) {
             return rolled;
         }
     }
-    if (auto written = writeCommit(index, lastDocument); !written) {
+    if (auto written = writeCommit(index, events, lastDocument); !written) {
         return written;
     }
     index.clearDirty();
+    events.clear();
     gapIsNew_ = false;
     return {};
 }
 
-Expected<void> Journal::writeCommit(const Index& index, std::uint32_t lastDocument) {
+Expected<void> Journal::writeCommit(const Index& index, const EventBatch& /*events*/,
+                                    std::uint32_t lastDocument) {
     const std::uint64_t start = writer_.offset();
     FrameStream out(writer_, sequence_, lastEvent_);
     Expected<void> done;

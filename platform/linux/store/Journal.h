@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "platform/foundation/Error.h"
+#include "platform/linux/store/EventBatch.h"
 #include "platform/linux/store/IdentifierRange.h"
 #include "platform/linux/store/Index.h"
 #include "platform/linux/store/Record.h"
@@ -39,11 +40,13 @@ class Journal {
     }
     [[nodiscard]] const std::vector<EventGap>& gaps() const { return gaps_; }
 
-    [[nodiscard]] bool hasChanges(const Index& index, std::uint32_t lastDocument) const;
-    // Writes what is dirty, each row under a new event identifier, and syncs it: all of it counts,
-    // or nothing. Then the index is clean. Costs nothing when nothing changed. After an error the
-    // index is as dirty as before and the counters are as they were.
-    [[nodiscard]] Expected<void> commit(Index& index, std::uint32_t lastDocument);
+    [[nodiscard]] bool hasChanges(const Index& index, const EventBatch& events,
+                                  std::uint32_t lastDocument) const;
+    // Writes the events, each under a new identifier, and the rows that are dirty, and syncs it:
+    // all of it counts, or nothing. Then index and batch are clean. Costs nothing when nothing
+    // changed. After an error both are as they were before, and so are the counters.
+    [[nodiscard]] Expected<void> commit(Index& index, EventBatch& events,
+                                        std::uint32_t lastDocument);
     // The error that ended writing for good (a failed sync says nothing about what is on the disk).
     [[nodiscard]] const std::optional<Error>& failure() const { return failure_; }
 
@@ -78,7 +81,8 @@ class Journal {
     void noteGap();
     void trimGaps();
 
-    [[nodiscard]] Expected<void> writeCommit(const Index& index, std::uint32_t lastDocument);
+    [[nodiscard]] Expected<void> writeCommit(const Index& index, const EventBatch& events,
+                                             std::uint32_t lastDocument);
     [[nodiscard]] Expected<void> rollSegment();
     [[nodiscard]] Expected<void> writeHead();
     void removeOldSegments();

@@ -41,6 +41,10 @@ Expected<UUID> Store::volumeUUID(const URL& url) {
     return core_->volumeUUID(url);
 }
 
+std::unique_ptr<FileEventStream> Store::makeStream(FileEventStreamRequest /*request*/) {
+    return nullptr;
+}
+
 Expected<void> Store::assignDocumentIDs(std::span<Request> requests) {
     return core_->assignDocumentIDs(requests);
 }

@@ -57,6 +57,8 @@ class Store final : public GenerationStore, public FileEventService, public Docu
     // FileEventService.
     [[nodiscard]] Expected<EventID> currentEventID() override;
     [[nodiscard]] Expected<UUID> volumeUUID(const URL& url) override;
+    [[nodiscard]] std::unique_ptr<FileEventStream> makeStream(
+        FileEventStreamRequest request) override;
 
     // DocumentIndex. What lies outside the root, or in the state or cache folder, is ENOENT; what
     // lies behind a mount is ENXIO.

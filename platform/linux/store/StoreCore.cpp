@@ -18,7 +18,7 @@ void Store::Core::waitUntilIdle() {
 }
 
 Expected<void> Store::Core::commit() {
-    auto committed = journal_->commit(index_, lastDocument_);
+    auto committed = journal_->commit(index_, events_, lastDocument_);
     if (committed) {
         writeError_.reset();
     } else {
@@ -28,7 +28,7 @@ Expected<void> Store::Core::commit() {
 }
 
 void Store::Core::writeSnapshotIfLong() {
-    if (!journal_->wantsSnapshot() || journal_->hasChanges(index_, lastDocument_)) {
+    if (!journal_->wantsSnapshot() || journal_->hasChanges(index_, events_, lastDocument_)) {
         return;
     }
     if (auto written = journal_->writeSnapshot(index_); !written) {

@@ -135,6 +135,7 @@ class Store::Core {
     Mutex mutex_;
     std::condition_variable_any idle_;  // a reconcile ended
     Index index_ MARROWDALE_GUARDED_BY(mutex_);
+    EventBatch events_ MARROWDALE_GUARDED_BY(mutex_);  // not committed yet
     std::unique_ptr<Journal> journal_ MARROWDALE_GUARDED_BY(mutex_);
     std::uint32_t lastDocument_ MARROWDALE_GUARDED_BY(mutex_) = 0;
     bool reconciling_ MARROWDALE_GUARDED_BY(mutex_) = false;
