@@ -87,10 +87,48 @@ void EntryMerger::refresh(RowNumber number, const EntryLook& look) {
     values.set(Row::unreadable, row.has(Row::unreadable));
     values.fingerprint = look.fingerprint != 0 ? look.fingerprint : row.fingerprint;
     const bool sameSize = row.isFolder() || row.size == values.size;
+    const bool sameTime = row.changed == values.changed && !row.has(Row::unsure);
+    // A folder's time moves with every change in it, which is told of what changed there.
+    if (!row.isFolder() && (!sameSize || !sameTime)) {
+        changes_.changed(number);
+    }
     if (row.changed != values.changed || row.fingerprint != values.fingerprint || !sameSize ||
         (row.flags & Row::lastingFlags) != values.flags) {
         index_.update(number, values);
     }
+}
+
+void EntryMerger::makeSure(RowNumber number, const EntryLook& look) {
+    Row& row = index_.row(number);
+    if (row.isFree() || row.has(Row::limbo) || !isSameFile(row, look, true)) {
+        return;  // the next look finds what became of it
+    }
+    const Row values = valuesOf(look);
+    if (row.changed == values.changed && (row.isFolder() || row.size == values.size)) {
+        row.set(Row::unsure, values.has(Row::unsure));
+        index_.markDirty(number);
+    } else {
+        refresh(number, look);
+    }
+}
+
+void EntryMerger::noteAbsent(RowNumber folder, std::string_view name) {
+    const RowNumber known = index_.child(folder, name);
+    if (known != noRow) {
+        changes_.leave(known);
+    }
+}
+
+void EntryMerger::noteFolderDigest(RowNumber folder, std::uint32_t digest) {
+    Row& row = index_.row(folder);
+    if (row.attributes == digest) {
+        return;
+    }
+    if (row.attributes != 0) {
+        changes_.changed(folder);
+    }
+    row.attributes = digest;
+    index_.markDirty(folder);
 }
 
 RowNumber EntryMerger::addName(RowNumber folder, std::string_view name, const EntryLook& look,
@@ -98,8 +136,14 @@ RowNumber EntryMerger::addName(RowNumber folder, std::string_view name, const En
     Row values = valuesOf(look);
     values.setAge(kin.nextAge);
     const RowNumber added = index_.add(folder, name, values);
-    if (added != noRow && kin.document != 0) {
+    if (added == noRow) {
+        return noRow;
+    }
+    changes_.appeared(added);
+    if (kin.document != 0) {
         index_.setDocument(added, kin.document);
+    } else {
+        saves_.revive(added);
     }
     return added;
 }
@@ -115,7 +159,7 @@ RowNumber EntryMerger::merge(RowNumber folder, std::string_view name, const Entr
         return noRow;
     }
     if (current != noRow) {
-        index_.putInLimbo(current);
+        changes_.leave(current);
     }
     const bool isInLimbo = kin.row != noRow && index_.row(kin.row).has(Row::limbo);
     const bool hasOneName = look.status.isDirectory() || look.status.linkCount <= 1;
@@ -123,9 +167,9 @@ RowNumber EntryMerger::merge(RowNumber folder, std::string_view name, const Entr
         return addName(folder, name, look, kin);
     }
     if (!isInLimbo) {
-        index_.putInLimbo(kin.row);
+        changes_.leave(kin.row);
     }
-    if (!index_.place(kin.row, folder, name)) {
+    if (!changes_.arrive(kin.row, folder, name)) {
         return noRow;
     }
     refresh(kin.row, look);

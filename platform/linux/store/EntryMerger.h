@@ -6,6 +6,8 @@
 #include "platform/foundation/Date.h"
 #include "platform/linux/files/EntryStatus.h"
 #include "platform/linux/store/Index.h"
+#include "platform/linux/store/SafeSaves.h"
+#include "platform/linux/store/TreeChanges.h"
 
 namespace marrowdale::native {
 
@@ -22,7 +24,9 @@ struct EntryLook {
 // thread at a time, as the index.
 class EntryMerger {
   public:
-    explicit EntryMerger(Index& index) : index_(index) {}
+    // What it finds is told to `changes` and `saves`.
+    EntryMerger(Index& index, TreeChanges& changes, SafeSaves& saves)
+        : index_(index), changes_(changes), saves_(saves) {}
 
     // The row at (folder, name) when the status alone shows that it still is what it was; else
     // noRow, and the entry must be looked at with its fingerprint and merged. `guess` may name a
@@ -35,6 +39,13 @@ class EntryMerger {
     // (the folder is below it in the index, because folders are being moved about; or the index is
     // full).
     [[nodiscard]] RowNumber merge(RowNumber folder, std::string_view name, const EntryLook& look);
+    // Nothing stands at that name.
+    void noteAbsent(RowNumber folder, std::string_view name);
+    // What a folder's own metadata are now (folderDigest).
+    void noteFolderDigest(RowNumber folder, std::uint32_t digest);
+
+    // A second look, when enough time has passed to be sure of the first.
+    void makeSure(RowNumber number, const EntryLook& look);
 
     // Whether the row's file is the one that was found. `samePlace`: it stood at the very name,
     // which is enough where the file system has neither birth times nor handles.
@@ -56,6 +67,8 @@ class EntryMerger {
                                     const Kin& kin);
 
     Index& index_;
+    TreeChanges& changes_;
+    SafeSaves& saves_;
 };
 
 }  // namespace marrowdale::native

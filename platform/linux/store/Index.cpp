@@ -188,15 +188,17 @@ bool Index::hasLimbo() const {
     });
 }
 
-std::size_t Index::removeLimbo() {
-    const std::size_t before = count_;
+std::vector<RowNumber> Index::limboRows() const {
+    std::vector<RowNumber> rows;
     for (const RowNumber number : limbo_) {
         if (!row(number).isFree() && row(number).has(Row::limbo)) {
-            remove(number);
+            rows.push_back(number);
         }
     }
-    std::vector<RowNumber>().swap(limbo_);
-    return before - count_;
+    std::ranges::sort(rows);
+    const auto repeated = std::ranges::unique(rows);
+    rows.erase(repeated.begin(), repeated.end());
+    return rows;
 }
 
 // The list of a folder is kept in the order in which its entries came, which is the order in which
@@ -281,6 +283,11 @@ void Index::putInLimbo(RowNumber number) {
     row(number).set(Row::limbo, true);
     row(number).set(Row::seen, false);
     row(number).parent = noRow;
+    if (limbo_.size() == limbo_.capacity()) {
+        std::erase_if(limbo_, [this](RowNumber other) {
+            return row(other).isFree() || !row(other).has(Row::limbo);
+        });
+    }
     limbo_.push_back(number);
     markDirty(number);
 }

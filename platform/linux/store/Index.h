@@ -55,10 +55,9 @@ class Index {
     [[nodiscard]] RowNumber addInLimbo(std::string_view name, const Row& values);
     // Takes a placed row off its folder.
     void putInLimbo(RowNumber number);
-    // Whether rows are in limbo.
+    // Whether rows are in limbo; and which.
     [[nodiscard]] bool hasLimbo() const;
-    // Frees the rows that are in limbo, and all below them. Answers how many those were.
-    std::size_t removeLimbo();
+    [[nodiscard]] std::vector<RowNumber> limboRows() const;
     // Places a row that is in limbo. False when there is no room for the name.
     [[nodiscard]] bool place(RowNumber number, RowNumber folder, std::string_view name);
     // Sets changed, size, fingerprint and the lasting flags of a placed row. The kind must not

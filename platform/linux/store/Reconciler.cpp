@@ -6,6 +6,8 @@
 #include <thread>
 #include <utility>
 
+#include "platform/linux/store/FolderDigest.h"
+
 namespace marrowdale::native {
 
 namespace {
@@ -34,33 +36,43 @@ void note(std::vector<std::string>& paths, std::uint64_t& count, std::string pat
 
 }  // namespace
 
-Reconciler::Reconciler(Index& index, Mutex& mutex, int root, const std::string& rootPath,
-                       std::vector<FileID> skipped)
-    : mutex_(mutex),
-      index_(index),
-      merger_(index),
-      root_(root),
-      rootPath_(rootPath),
-      skipped_(std::move(skipped)) {}
+Reconciler::Reconciler(const TreeScope& scope)
+    : mutex_(scope.mutex),
+      index_(scope.index),
+      changes_(scope.changes),
+      merger_(scope.index, scope.changes, scope.saves),
+      watches_(scope.watches),
+      root_(scope.root),
+      rootPath_(scope.rootPath),
+      device_(scope.device),
+      skipped_(scope.skipped) {}
 
 Expected<ReconcileReport> Reconciler::run() {
-    const auto started = std::chrono::steady_clock::now();
     if (auto done = startAtRoot(); !done) {
         return Unexpected(done.error());
     }
-    bool settled = false;
-    for (int round = 0; round < mostRounds && !settled; ++round) {
-        walk();
-        settled = !pushChangedFolders();
+    return walkUntilSettled(Threads::two);
+}
+
+Expected<ReconcileReport> Reconciler::runOn(std::vector<RowNumber> folders) {
+    {
+        const MutexLock lock(mutex_);
+        stack_ = std::move(folders);
+    }
+    return walkUntilSettled(Threads::one);
+}
+
+Expected<ReconcileReport> Reconciler::walkUntilSettled(Threads threads) {
+    const auto started = std::chrono::steady_clock::now();
+    settled_ = false;
+    for (int round = 0; round < mostRounds && !settled_; ++round) {
+        walk(threads);
+        settled_ = !pushChangedFolders();
     }
     const MutexLock lock(mutex_);
     if (failure_) {
         return Unexpected(*failure_);
     }
-    if (settled) {
-        index_.removeLimbo();
-    }
-    report_.differences = index_.dirty().size();
     report_.finished = Date::now();
     report_.duration = std::chrono::steady_clock::now() - started;
     return report_;
@@ -74,21 +86,24 @@ Expected<void> Reconciler::startAtRoot() {
     }
     const auto fingerprint = handleFingerprint(root_, "");
     const EntryLook look{*status, fingerprint ? *fingerprint : 0, now};
-    device_ = status->device;
     const MutexLock lock(mutex_);
     if (index_.endOfRows() <= rootRow) {
         (void)index_.add(noRow, {}, EntryMerger::valuesOf(look));
     } else if (!EntryMerger::isUnchanged(index_.row(rootRow), *status)) {
-        index_.update(rootRow, EntryMerger::valuesOf(look));
+        Row values = EntryMerger::valuesOf(look);
+        values.set(Row::unreadable, index_.row(rootRow).has(Row::unreadable));
+        index_.update(rootRow, values);
     }
     stack_.push_back(rootRow);
     return {};
 }
 
-void Reconciler::walk() {
+void Reconciler::walk(Threads threads) {
     std::thread second;
     try {
-        second = std::thread([this] { work(); });
+        if (threads == Threads::two) {
+            second = std::thread([this] { work(); });
+        }
     } catch (const std::system_error&) {
         // One thread does it too.
     }
@@ -142,7 +157,18 @@ std::optional<Reconciler::Visit> Reconciler::takeFolder() {
 void Reconciler::visit(Visit& visit) {
     Batch batch;
     const Outcome outcome = list(visit, batch);
+    if (outcome == Outcome::unreadable) {
+        noteUnreadable(visit);
+    }
     finishFolder(visit, outcome);
+}
+
+void Reconciler::noteUnreadable(const Visit& visit) {
+    const auto status = statEntry(root_, visit.path.c_str());
+    if (status) {
+        const MutexLock lock(mutex_);
+        merger_.noteFolderDigest(visit.folder, folderDigest(-1, *status));
+    }
 }
 
 Reconciler::Outcome Reconciler::outcomeOf(const Error& error) {
@@ -180,7 +206,13 @@ Reconciler::Outcome Reconciler::list(Visit& visit, Batch& batch) {
         if (status->device != device_ || raw(status->fileID) != index_.row(visit.folder).fileID) {
             return Outcome::vanished;
         }
+    }
+    watches_.watchFolder(folder->get(), status->fileID, visit.folder == rootRow);
+    const std::uint32_t digest = folderDigest(folder->get(), *status);
+    {
+        const MutexLock lock(mutex_);
         stamps_.push_back({visit.folder, isWithinTick(status->modified, now), status->modified});
+        merger_.noteFolderDigest(visit.folder, digest);
     }
     DirectoryReader reader(std::move(*folder), crawlBuffer);
     bool atEnd = false;
@@ -217,6 +249,7 @@ Reconciler::Outcome Reconciler::fillBatch(Visit& visit, DirectoryReader& reader,
         if (isForeign(*status)) {
             keepMountPoint(visit, (*entry)->name);
         } else if (std::ranges::find(skipped_, status->fileID) == skipped_.end()) {
+            watches_.watchFile(reader.descriptor(), (*entry)->cName(), *status);
             addToBatch(**entry, *status, batch);
         }
     }
@@ -326,7 +359,7 @@ void Reconciler::finishFolder(const Visit& visit, Outcome outcome) {
         if (row.has(Row::seen)) {
             row.set(Row::seen, false);
         } else if (outcome == Outcome::listed) {
-            index_.putInLimbo(child);
+            changes_.leave(child);
         }
     }
     if (outcome == Outcome::vanished) {

@@ -10,29 +10,47 @@
 #include "platform/foundation/Error.h"
 #include "platform/linux/files/DirectoryReader.h"
 #include "platform/linux/store/EntryMerger.h"
+#include "platform/linux/store/FolderWatches.h"
 #include "platform/linux/store/Index.h"
 #include "platform/linux/store/Mutex.h"
 #include "platform/linux/store/StoreReport.h"
 
 namespace marrowdale::native {
 
-// One walk over the tree that brings the index to what is on disk. Made for one run.
+// What a walk works on, and with.
+struct TreeScope {
+    Index& index;
+    Mutex&
+        mutex;  // guards the index and what notes its changes; nobody else changes them meanwhile
+    TreeChanges& changes;
+    SafeSaves& saves;
+    FolderWatches& watches;
+    int root;  // the open root folder
+    const std::string& rootPath;
+    DeviceID device;
+    std::vector<FileID> skipped;  // folders on its device that are left out
+};
+
+// A walk over the tree, or over some folders of it, that brings the index to what is on disk. Made
+// for one run. Each folder is watched before it is listed, where there is a watcher.
 //
 // Each folder is listed below the root by folder handle, links never followed; entries that show
 // no change cost one statx. What is not met any more goes to limbo, and comes back with its row
-// (document, and all below it) where it is met elsewhere; at the end what is still in limbo is
-// removed. Before that, folders that changed after they were listed are listed again, for things
+// (document, and all below it) where it is met elsewhere; what is still in limbo at the end is
+// gone. Before that, folders that changed after they were listed are listed again, for things
 // may have been moved from where the walk had not been to where it had.
 class Reconciler {
   public:
-    // `mutex` guards `index`; nobody else changes the index while the run lasts. `root` is the open
-    // root folder. `skipped` are folders on its device that are left out.
-    Reconciler(Index& index, Mutex& mutex, int root, const std::string& rootPath,
-               std::vector<FileID> skipped);
+    explicit Reconciler(const TreeScope& scope);
 
-    // Walks with two threads. Errors: the root can't be read; no memory or descriptors are left.
-    // After an error the index is good, but not up to date: nothing was removed.
+    // Walks the whole tree, with two threads. Errors: the root can't be read; no memory or
+    // descriptors are left. After an error the index is good, but not up to date.
     [[nodiscard]] Expected<ReconcileReport> run();
+    // Walks these folders and what is below them, on this thread. They are placed.
+    [[nodiscard]] Expected<ReconcileReport> runOn(std::vector<RowNumber> folders);
+    // After a run: whether what is in limbo is gone for sure; else something kept moving under the
+    // walk.
+    [[nodiscard]] bool isSettled() const { return settled_; }
 
   private:
     struct Found {
@@ -66,8 +84,12 @@ class Reconciler {
     };
     enum class Outcome : std::uint8_t { listed, unreadable, vanished };
 
+    enum class Threads : std::uint8_t { one, two };
+
     [[nodiscard]] Expected<void> startAtRoot() MARROWDALE_EXCLUDES(mutex_);
-    void walk();
+    [[nodiscard]] Expected<ReconcileReport> walkUntilSettled(Threads threads)
+        MARROWDALE_EXCLUDES(mutex_);
+    void walk(Threads threads);
     void work() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] std::optional<Visit> takeFolder() MARROWDALE_EXCLUDES(mutex_);
     void visit(Visit& visit);
@@ -84,17 +106,21 @@ class Reconciler {
     [[nodiscard]] bool isForeign(const EntryStatus& status) const;
     void keepMountPoint(const Visit& visit, std::string_view name) MARROWDALE_EXCLUDES(mutex_);
     void setUnreadable(RowNumber folder, bool unreadable) MARROWDALE_REQUIRES(mutex_);
+    void noteUnreadable(const Visit& visit) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Outcome outcomeOf(const Error& error) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] bool pushChangedFolders() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] bool hasChanged(const Stamp& stamp) MARROWDALE_EXCLUDES(mutex_);
 
     Mutex& mutex_;
     Index& index_ MARROWDALE_GUARDED_BY(mutex_);
+    TreeChanges& changes_ MARROWDALE_GUARDED_BY(mutex_);
     EntryMerger merger_ MARROWDALE_GUARDED_BY(mutex_);
+    FolderWatches& watches_;
     const int root_;
     const std::string& rootPath_;
+    const DeviceID device_;
     const std::vector<FileID> skipped_;
-    DeviceID device_{};  // set before the threads start
+    bool settled_ = false;
     std::condition_variable_any changed_;
     std::vector<RowNumber> stack_ MARROWDALE_GUARDED_BY(mutex_);
     std::vector<RowNumber> later_ MARROWDALE_GUARDED_BY(mutex_);  // are being listed by another

@@ -28,6 +28,10 @@ struct alignas(64) Row {
     static constexpr std::uint32_t seen = 1U << 24U;      // met by the reconcile that is running
     static constexpr std::uint32_t visiting = 1U << 26U;  // being listed
     static constexpr std::uint32_t dirty = 1U << 27U;     // differs from the log
+    // What the next events are to tell of the row.
+    static constexpr std::uint32_t touchedAppeared = 1U << 29U;
+    static constexpr std::uint32_t touchedChanged = 1U << 30U;
+    static constexpr std::uint32_t touchedRenamed = 1U << 31U;
     static constexpr std::uint32_t ageShift = 8;
     static constexpr std::uint32_t ageLimit = 0xFFFF;
 
@@ -42,7 +46,7 @@ struct alignas(64) Row {
     RowNumber next;          // of the same folder
     RowNumber previous;      // the first one's is the last one
     std::uint32_t flags;
-    std::uint32_t attributes;  // reserved: last seen metadata
+    std::uint32_t attributes;  // of a folder: digest of its own metadata; 0: not looked at yet
 
     [[nodiscard]] RowKind kind() const { return static_cast<RowKind>(flags & kindBits); }
     [[nodiscard]] bool isFree() const { return kind() == RowKind::free; }

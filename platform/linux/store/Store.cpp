@@ -33,16 +33,40 @@ Expected<DocumentID> Store::getOrAllocateDocumentID(const OpenFile& file) {
     return core_->documentOf(file);
 }
 
-Expected<EventID> Store::currentEventID() {
-    return core_->currentEventID();
+Expected<EventID> Store::barrier() {
+    return core_->barrier();
+}
+
+EventID Store::lastEventID() {
+    return core_->lastEventID();
+}
+
+EventHistory::Standing Store::standingOf(EventID since) {
+    return core_->standingOf(since);
+}
+
+Expected<std::unique_ptr<EventCursor>> Store::eventsSince(EventID since) {
+    return core_->eventsSince(since);
+}
+
+std::string Store::rootPath() {
+    return core_->rootPath();
+}
+
+DeviceID Store::device() {
+    return core_->device();
 }
 
 Expected<UUID> Store::volumeUUID(const URL& url) {
     return core_->volumeUUID(url);
 }
 
-std::unique_ptr<FileEventStream> Store::makeStream(FileEventStreamRequest /*request*/) {
-    return nullptr;
+std::uint64_t Store::addListener(std::function<void(News)> listener) {
+    return core_->addListener(std::move(listener));
+}
+
+void Store::removeListener(std::uint64_t number) {
+    core_->removeListener(number);
 }
 
 Expected<void> Store::assignDocumentIDs(std::span<Request> requests) {

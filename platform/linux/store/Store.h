@@ -1,13 +1,14 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <span>
 #include <string>
 
 #include "platform/linux/files/DocumentIndex.h"
+#include "platform/linux/store/EventHistory.h"
 #include "platform/linux/store/StoreOptions.h"
 #include "platform/linux/store/StoreReport.h"
-#include "platform/services/FileEventService.h"
 #include "platform/services/GenerationStore.h"
 
 namespace marrowdale::native {
@@ -19,7 +20,7 @@ namespace marrowdale::native {
 // Nothing is handed out before it is synced to disk. When the disk refuses (ENOSPC, EIO, …), new
 // identifiers are refused with that error and everything known is still answered; after a failed
 // sync that lasts until the store is opened again.
-class Store final : public GenerationStore, public FileEventService, public DocumentIndex {
+class Store final : public GenerationStore, public EventHistory, public DocumentIndex {
   public:
     // Takes the lock, loads (or makes) the root folder's store and reconciles it with the disk. It
     // is the folder that counts, not its path: a folder that was moved keeps its store, another
@@ -54,11 +55,16 @@ class Store final : public GenerationStore, public FileEventService, public Docu
     // The file must be below the root: ENOENT otherwise, ENXIO on another volume.
     [[nodiscard]] Expected<DocumentID> getOrAllocateDocumentID(const OpenFile& file) override;
 
-    // FileEventService.
-    [[nodiscard]] Expected<EventID> currentEventID() override;
+    // EventHistory.
+    [[nodiscard]] Expected<EventID> barrier() override;
+    [[nodiscard]] EventID lastEventID() override;
+    [[nodiscard]] Standing standingOf(EventID since) override;
+    [[nodiscard]] Expected<std::unique_ptr<EventCursor>> eventsSince(EventID since) override;
+    [[nodiscard]] std::string rootPath() override;
+    [[nodiscard]] DeviceID device() override;
     [[nodiscard]] Expected<UUID> volumeUUID(const URL& url) override;
-    [[nodiscard]] std::unique_ptr<FileEventStream> makeStream(
-        FileEventStreamRequest request) override;
+    [[nodiscard]] std::uint64_t addListener(std::function<void(News)> listener) override;
+    void removeListener(std::uint64_t number) override;
 
     // DocumentIndex. What lies outside the root, or in the state or cache folder, is ENOENT; what
     // lies behind a mount is ENXIO.

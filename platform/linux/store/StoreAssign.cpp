@@ -20,9 +20,10 @@ Expected<void> Store::Core::assignDocumentIDs(std::span<Request> requests) {
             return allowed;
         }
     }
-    if (foldersKnown && !*foldersKnown) {
-        // A folder made since the last reconcile.
-        if (auto done = reconcileOnce(); !done) {
+    if (foldersKnown && (!*foldersKnown || (watcher_ && !unknown.empty()))) {
+        // Something made since the last look, or a name that has another file now: what was told of
+        // it meanwhile says more than the look that follows.
+        if (auto done = lookForMissing(); !done) {
             return done;
         }
         foldersKnown = fillKnown(requests, unknown);
@@ -103,7 +104,7 @@ Expected<bool> Store::Core::fillKnown(std::span<Request> requests,
     RowNumber parent = noRow;
     const MutexLock lock(mutex_);
     waitUntilIdle();
-    const EntryMerger merger(index_);
+    const EntryMerger merger(index_, changes_, saves_);
     RowNumber guess = noRow;
     for (std::size_t i = 0; i < requests.size(); ++i) {
         Request& request = requests[i];
@@ -188,7 +189,8 @@ Expected<std::vector<Store::Core::Looked>> Store::Core::lookAtEntries(
 RowNumber Store::Core::rowOf(const Request& request) {
     const RowNumber parent = folderRow(request.folder);
     return parent == noRow ? noRow
-                           : EntryMerger(index_).unchangedRow(parent, request.name, request.status);
+                           : EntryMerger(index_, changes_, saves_)
+                                 .unchangedRow(parent, request.name, request.status);
 }
 
 // What stands is put into the index at its name. What went meanwhile keeps the row it has, or gets
@@ -196,7 +198,8 @@ RowNumber Store::Core::rowOf(const Request& request) {
 RowNumber Store::Core::rowOfLook(const Request& request, const Looked& looked) {
     const RowNumber parent = folderRow(request.folder);
     if (looked.stands && parent != noRow) {
-        const RowNumber row = EntryMerger(index_).merge(parent, request.name, looked.look);
+        const RowNumber row =
+            EntryMerger(index_, changes_, saves_).merge(parent, request.name, looked.look);
         if (row != noRow) {
             return row;
         }

@@ -7,96 +7,17 @@
 #include <utility>
 
 #include "platform/linux/store/DiskCheck.h"
-#include "platform/linux/store/Reconciler.h"
 
 namespace marrowdale::native {
 
-void Store::Core::waitUntilIdle() {
-    while (reconciling_) {
-        idle_.wait(mutex_);
-    }
-}
-
-Expected<void> Store::Core::commit() {
-    auto committed = journal_->commit(index_, events_, lastDocument_);
-    if (committed) {
-        writeError_.reset();
-    } else {
-        writeError_ = committed.error();
-    }
-    return committed;
-}
-
 void Store::Core::writeSnapshotIfLong() {
-    if (!journal_->wantsSnapshot() || journal_->hasChanges(index_, events_, lastDocument_)) {
+    if (!journal_->wantsSnapshot() || changes_.hasChanges() ||
+        journal_->hasChanges(index_, events_, lastDocument_)) {
         return;
     }
     if (auto written = journal_->writeSnapshot(index_); !written) {
         log("no snapshot could be written: " + written.error().description());
     }
-}
-
-Expected<void> Store::Core::reconcile() {
-    if (auto done = reconcileOnce(); !done) {
-        return done;
-    }
-    const MutexLock lock(mutex_);
-    waitUntilIdle();
-    return writeError_ ? Unexpected(*writeError_) : Expected<void>();
-}
-
-// A run that began after the caller came serves the caller too.
-Expected<void> Store::Core::reconcileOnce() {
-    {
-        const MutexLock lock(mutex_);
-        const std::uint64_t startedBefore = runsStarted_;
-        waitUntilIdle();
-        if (runsStarted_ > startedBefore) {
-            return lastRunError_ ? Unexpected(*lastRunError_) : Expected<void>();
-        }
-        reconciling_ = true;
-        ++runsStarted_;
-    }
-    auto done = runReconcile();
-    const MutexLock lock(mutex_);
-    lastRunError_ = done ? std::optional<Error>() : done.error();
-    reconciling_ = false;
-    idle_.notify_all();
-    return done;
-}
-
-std::vector<FileID> Store::Core::unindexedFolders() const {
-    std::vector<FileID> folders;
-    for (const std::string& path : {state_.path(), cacheFolder_}) {
-        if (path.empty()) {
-            continue;
-        }
-        const auto status = statEntry(AT_FDCWD, path.c_str());
-        if (status && status->device == device_) {
-            folders.push_back(status->fileID);
-        }
-    }
-    return folders;
-}
-
-Expected<void> Store::Core::runReconcile() {
-    const auto standing = statEntry(AT_FDCWD, rootPath_.c_str());
-    const auto held = statEntry(root_.get(), "");
-    if (!standing || !held || standing->fileID != held->fileID ||
-        standing->device != held->device) {
-        return Unexpected(
-            errorWithPOSIXCode(standing ? ESTALE : standing.error().code, "look at", rootPath_));
-    }
-    auto report =
-        Reconciler(indexForReconciler(), mutex_, root_.get(), rootPath_, unindexedFolders()).run();
-    if (!report) {
-        return Unexpected(report.error());
-    }
-    const MutexLock lock(mutex_);
-    lastReconcile_ = std::move(*report);
-    // Where the disk is full the index is right all the same, and what is known can be answered.
-    (void)commit();
-    return {};
 }
 
 StoreReport Store::Core::report() {
@@ -126,16 +47,14 @@ StoreReport Store::Core::report() {
     report.documentIDsLeft = std::numeric_limits<std::uint32_t>::max() - lastDocument_;
     report.writeError = writeError_;
     report.reconcile = lastReconcile_;
-    return report;
-}
-
-Expected<EventID> Store::Core::currentEventID() {
-    const MutexLock lock(mutex_);
-    waitUntilIdle();
-    if (auto committed = commit(); !committed) {
-        return Unexpected(committed.error());
+    report.recorder = recorderReport_;
+    report.recorder.isLive = recording_ == StoreOptions::Recording::live;
+    if (watcher_) {
+        report.recorder.watcher = watcher_->status();
+        report.recorder.unwatchedFolders = watches_->unwatched().size();
+        report.recorder.problem = watches_->problem();
     }
-    return EventID{journal_->lastEvent()};
+    return report;
 }
 
 Expected<UUID> Store::Core::volumeUUID(const URL& url) const {
@@ -151,6 +70,7 @@ Expected<UUID> Store::Core::volumeUUID(const URL& url) const {
 
 void Store::Core::addPlace(RowNumber number, std::vector<Place>& places) {
     Place place;
+    place.number = number;
     if (index_.path(number, place.path)) {
         place.row = index_.row(number);
         places.push_back(std::move(place));
@@ -215,7 +135,7 @@ Expected<std::string> Store::Core::pathForFileID(DeviceID device, FileID file) {
             return path.empty() ? rootPath_ : rootPath_ + (rootPath_ == "/" ? "" : "/") + path;
         }
         if (!lastTry) {
-            if (auto done = reconcileOnce(); !done) {
+            if (auto done = lookForMissing(); !done) {
                 return Unexpected(done.error());
             }
         }
@@ -242,7 +162,7 @@ Expected<FileID> Store::Core::resolveDocumentID(DocumentID document, DeviceID de
         if (lastTry || !isKnown || raw(document) == 0) {
             break;
         }
-        if (auto done = reconcileOnce(); !done) {
+        if (auto done = lookForMissing(); !done) {
             return Unexpected(done.error());
         }
     }

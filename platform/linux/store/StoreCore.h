@@ -2,22 +2,31 @@
 
 #include <condition_variable>
 #include <cstdint>
+#include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <span>
 #include <string>
+#include <thread>
 #include <vector>
 
+#include "platform/linux/events/HintSet.h"
 #include "platform/linux/files/UniqueFD.h"
 #include "platform/linux/store/EntryMerger.h"
+#include "platform/linux/store/EventHistory.h"
+#include "platform/linux/store/FolderWatches.h"
 #include "platform/linux/store/Index.h"
 #include "platform/linux/store/Journal.h"
 #include "platform/linux/store/Mutex.h"
+#include "platform/linux/store/Reconciler.h"
+#include "platform/linux/store/SafeSaves.h"
 #include "platform/linux/store/StateFolder.h"
 #include "platform/linux/store/Store.h"
 #include "platform/linux/store/StoreFolder.h"
 #include "platform/linux/store/StoreIdentity.h"
 #include "platform/linux/store/StoreLock.h"
+#include "platform/linux/store/TreeChanges.h"
 
 namespace marrowdale::native {
 
@@ -38,7 +47,16 @@ class Store::Core {
     [[nodiscard]] Expected<FileID> resolveDocumentID(DocumentID document, DeviceID device)
         MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<DocumentID> documentOf(const OpenFile& file) MARROWDALE_EXCLUDES(mutex_);
-    [[nodiscard]] Expected<EventID> currentEventID() MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<EventID> barrier() MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] EventID lastEventID() MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] EventHistory::Standing standingOf(EventID since) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<std::unique_ptr<EventCursor>> eventsSince(EventID since)
+        MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] const std::string& rootPath() const { return rootPath_; }
+    [[nodiscard]] DeviceID device() const { return device_; }
+    [[nodiscard]] std::uint64_t addListener(std::function<void(EventHistory::News)> listener)
+        MARROWDALE_EXCLUDES(listenersMutex_);
+    void removeListener(std::uint64_t number) MARROWDALE_EXCLUDES(listenersMutex_);
     [[nodiscard]] Expected<UUID> volumeUUID(const URL& url) const;
     [[nodiscard]] Expected<void> assignDocumentIDs(std::span<Request> requests)
         MARROWDALE_EXCLUDES(mutex_);
@@ -50,6 +68,7 @@ class Store::Core {
   private:
     // One name of a file, as the index has it.
     struct Place {
+        RowNumber number = noRow;
         std::string path;  // below the root
         Row row;
     };
@@ -78,16 +97,43 @@ class Store::Core {
     [[nodiscard]] std::vector<FileID> unindexedFolders() const;
     [[nodiscard]] bool isUnindexed(const Request& request, std::span<const FileID> folders) const;
 
-    // Requests wait here while a reconcile runs.
+    // Bringing the index up to what is on disk (StoreUpdate.cpp). One pass runs at a time; requests
+    // wait for it.
+    enum class Pass : std::uint8_t {
+        hints,  // the places that the watcher named
+        full,   // everything
+    };
     void waitUntilIdle() MARROWDALE_REQUIRES(mutex_);
-    [[nodiscard]] Expected<void> reconcileOnce() MARROWDALE_EXCLUDES(mutex_);
-    [[nodiscard]] Expected<void> runReconcile() MARROWDALE_EXCLUDES(mutex_);
-    // It takes the mutex by itself; requests wait because of `reconciling_`.
-    [[nodiscard]] Index& indexForReconciler() MARROWDALE_NO_THREAD_SAFETY_ANALYSIS {
-        return index_;
-    }
+    // A pass that began after the call serves the caller too.
+    [[nodiscard]] Expected<void> runOnce(Pass pass) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<void> reconcileOnce() { return runOnce(Pass::full); }
+    // What is cheapest to see everything that was done before the call: for those who did not find
+    // what they looked for.
+    [[nodiscard]] Expected<void> lookForMissing();
+    [[nodiscard]] Expected<void> run(Pass pass) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<void> look(Pass pass) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<void> runFull(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
+    // False when everything must be looked at.
+    [[nodiscard]] Expected<bool> runHints(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<bool> drain(HintSet& hints) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<void> listUnwatched(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<void> checkRoot() MARROWDALE_EXCLUDES(mutex_);
+    void noteRootProblem(const std::optional<Error>& problem) MARROWDALE_EXCLUDES(mutex_);
+    void settle(SafeSaves::Knowledge knowledge) MARROWDALE_EXCLUDES(mutex_);
+    void removeLimbo() MARROWDALE_REQUIRES(mutex_);
+    void makeSure() MARROWDALE_EXCLUDES(mutex_);
+    void finishUpdates() MARROWDALE_EXCLUDES(mutex_);
+    // The pass takes the mutex by itself; requests wait because of `updating_`.
+    [[nodiscard]] TreeScope scope() MARROWDALE_NO_THREAD_SAFETY_ANALYSIS;
     [[nodiscard]] Expected<void> commit() MARROWDALE_REQUIRES(mutex_);
     void writeSnapshotIfLong() MARROWDALE_REQUIRES(mutex_);
+
+    // Listening (StoreRecorder.cpp).
+    void startWatching();
+    void startRecorder();
+    void stopRecorder();
+    void record();
+    void tell(EventHistory::News news) MARROWDALE_EXCLUDES(listenersMutex_);
 
     // Finding.
     [[nodiscard]] std::vector<Place> placesOfFile(FileID file) MARROWDALE_EXCLUDES(mutex_);
@@ -132,17 +178,38 @@ class Store::Core {
     std::string cacheFolder_;  // canonical; empty when there is none
     StoreIdentity identity_;
 
+    const PackageTypes packages_;
+
     Mutex mutex_;
-    std::condition_variable_any idle_;  // a reconcile ended
+    std::condition_variable_any idle_;  // a pass ended
     Index index_ MARROWDALE_GUARDED_BY(mutex_);
     EventBatch events_ MARROWDALE_GUARDED_BY(mutex_);  // not committed yet
     std::unique_ptr<Journal> journal_ MARROWDALE_GUARDED_BY(mutex_);
     std::uint32_t lastDocument_ MARROWDALE_GUARDED_BY(mutex_) = 0;
-    bool reconciling_ MARROWDALE_GUARDED_BY(mutex_) = false;
-    std::uint64_t runsStarted_ MARROWDALE_GUARDED_BY(mutex_) = 0;
+    TreeChanges changes_ MARROWDALE_GUARDED_BY(mutex_);
+    SafeSaves saves_ MARROWDALE_GUARDED_BY(mutex_);
+    bool updating_ MARROWDALE_GUARDED_BY(mutex_) = false;
+    // The store was made anew and never held anything that somebody could have asked for.
+    bool isFresh_ MARROWDALE_GUARDED_BY(mutex_) = false;
+    std::uint64_t passesStarted_ MARROWDALE_GUARDED_BY(mutex_) = 0;
+    std::uint64_t fullPassesStarted_ MARROWDALE_GUARDED_BY(mutex_) = 0;
     std::optional<Error> lastRunError_ MARROWDALE_GUARDED_BY(mutex_);
     std::optional<Error> writeError_ MARROWDALE_GUARDED_BY(mutex_);
     ReconcileReport lastReconcile_ MARROWDALE_GUARDED_BY(mutex_);
+    RecorderReport recorderReport_ MARROWDALE_GUARDED_BY(mutex_);
+
+    const StoreOptions::Recording recording_;
+    const std::optional<Watcher::Kind> watcherKind_;
+    std::unique_ptr<Watcher> watcher_;  // set while opening; none without
+    bool mustLookAtAll_ = false;        // touched by the pass that runs
+    std::unique_ptr<FolderWatches> watches_;
+    UniqueFD stop_;  // an event counter: the recorder is to end
+    std::thread recorder_;
+
+    Mutex listenersMutex_;
+    std::map<std::uint64_t, std::function<void(EventHistory::News)>> listeners_
+        MARROWDALE_GUARDED_BY(listenersMutex_);
+    std::uint64_t nextListener_ MARROWDALE_GUARDED_BY(listenersMutex_) = 1;
 };
 
 }  // namespace marrowdale::native

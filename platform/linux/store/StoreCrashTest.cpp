@@ -104,7 +104,7 @@ TEST_P(StoreCrashTest, WhatWasHandedOutBeforeAKillIsRightAfterwards) {
             ASSERT_TRUE(found) << document << " of " << fileID << " in round " << round;
             EXPECT_EQ(raw(*found), fileID);
         }
-        const auto event = store().currentEventID();
+        const auto event = store().barrier();
         ASSERT_TRUE(event);
         EXPECT_GE(raw(*event), lastEvent);
         lastEvent = raw(*event);
@@ -219,7 +219,7 @@ TEST_F(StoreFullDiskTest, OpensOnAFullDisk) {
     const auto& first = known.requests.front();
     EXPECT_EQ(*(*opened)->resolveDocumentID(first.document, first.status.device),
               first.status.fileID);
-    EXPECT_EQ((*opened)->currentEventID().error().code, ENOSPC);
+    EXPECT_EQ((*opened)->barrier().error().code, ENOSPC);
 }
 
 TEST_F(StoreFullDiskTest, MakingAStoreOnAFullDiskIsAnErrorThatSaysSo) {

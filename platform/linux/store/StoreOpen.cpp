@@ -36,7 +36,12 @@ Store::Core::Core(const StoreOptions& options, StateFolder state, StoreFolder fo
       rootPath_(options.rootPath),
       log_(options.log),
       lock_(std::move(lock)),
-      root_(std::move(root)) {}
+      root_(std::move(root)),
+      packages_(options.packages != nullptr ? *options.packages : PackageTypes()),
+      changes_(index_, packages_),
+      saves_(index_, changes_),
+      recording_(options.recording),
+      watcherKind_(options.watcher) {}
 
 Expected<std::unique_ptr<Store::Core>> Store::Core::open(const StoreOptions& options) {
     auto root = openFolder(options.rootPath);
@@ -69,15 +74,21 @@ Expected<std::unique_ptr<Store::Core>> Store::Core::open(const StoreOptions& opt
     if (auto done = core->loadOrMake(*binding); !done) {
         return Unexpected(done.error());
     }
+    core->startWatching();
     if (auto done = core->reconcileOnce(); !done) {
         return Unexpected(done.error());
     }
+    core->startRecorder();
     const MutexLock guard(core->mutex_);
+    core->waitUntilIdle();
     core->writeSnapshotIfLong();
     return core;
 }
 
 Store::Core::~Core() {
+    stopRecorder();
+    finishUpdates();
+    tell(EventHistory::News::closing);
     const MutexLock lock(mutex_);
     if (!journal_) {
         return;
@@ -151,6 +162,7 @@ Expected<void> Store::Core::sweep() const {
 Expected<void> Store::Core::make(const RootBinding& root, const std::string& reason) {
     const MutexLock lock(mutex_);
     index_ = Index();
+    isFresh_ = true;
     identity_ = StoreIdentity::fresh(root, folder_.state(), reason);
     if (auto made = folder_.create(identity_); !made) {
         return made;

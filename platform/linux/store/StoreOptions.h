@@ -1,15 +1,24 @@
 #pragma once
 
 #include <chrono>
+#include <cstdint>
 #include <optional>
 #include <string>
 
 #include "platform/foundation/Log.h"
+#include "platform/linux/events/Watcher.h"
+#include "platform/linux/files/PackageTypes.h"
 
 namespace marrowdale::native {
 
 // What a store is opened with. Paths are absolute.
 struct StoreOptions {
+    enum class Recording : std::uint8_t {
+        // Looks at the tree when it is opened, and when something is asked that it does not know.
+        once,
+        // Goes on listening, on a thread of its own, and records what happens as it happens.
+        live,
+    };
     // Holds the stores of all root folders that were ever opened with it, and one lock. Made (mode
     // 0700) when missing, with the folders above it. It may lie below the root: then it is never
     // indexed.
@@ -24,6 +33,12 @@ struct StoreOptions {
     std::optional<std::chrono::milliseconds> lockWait = std::chrono::milliseconds(0);
     // May be null. Must outlive the store.
     Log* log = nullptr;
+    Recording recording = Recording::once;
+    // The kind of watcher to use; none: the best there is.
+    std::optional<Watcher::Kind> watcher = std::nullopt;
+    // Which folders are packages; null: those that are whatever applications say. Must outlive the
+    // store.
+    const PackageTypes* packages = nullptr;
 };
 
 }  // namespace marrowdale::native

@@ -10,6 +10,7 @@
 #include "platform/foundation/Error.h"
 #include "platform/foundation/Identifiers.h"
 #include "platform/foundation/UUID.h"
+#include "platform/linux/events/Watcher.h"
 
 namespace marrowdale::native {
 
@@ -26,6 +27,17 @@ struct ReconcileReport {
     std::vector<std::string>
         skippedMounts;  // entries on which something is mounted, and subvolumes
     std::uint64_t skippedMountCount = 0;
+};
+
+// How a store listens to what happens.
+struct RecorderReport {
+    bool isLive = false;
+    std::optional<Watcher::Status> watcher;  // none: there is none, and `problem` says why
+    std::string problem;                 // why there is no watcher, or why folders are not watched
+    std::uint64_t unwatchedFolders = 0;  // listed again at each request instead
+    std::uint64_t passes = 0;            // batches of hints that were worked through
+    std::optional<Date> lastOverflow;    // the kernel's queue was full
+    std::optional<Error> rootProblem;    // the root does not stand where it stood
 };
 
 // One of the stores in a state folder.
@@ -63,6 +75,7 @@ struct StoreReport {
     // again.
     std::optional<Error> writeError;
     ReconcileReport reconcile;
+    RecorderReport recorder;
 };
 
 }  // namespace marrowdale::native

@@ -244,9 +244,9 @@ TEST_P(StoreRootsTest, StateAndCacheFoldersAreNeverIndexed) {
     }
     settle();
     ASSERT_TRUE(store().reconcile());
-    const auto before = *store().currentEventID();
+    const auto before = *store().barrier();
     ASSERT_TRUE(store().reconcile());
-    EXPECT_EQ(*store().currentEventID(), before);
+    EXPECT_EQ(*store().barrier(), before);
 }
 
 TEST_P(StoreRootsTest, WhatLiesInStateAndCacheFoldersGetsNoDocument) {

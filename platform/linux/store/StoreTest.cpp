@@ -333,17 +333,17 @@ TEST_P(StoreTest, OnlyNewIdentifiersAreSynced) {
 
 TEST_P(StoreTest, EventIdentifiersOnlyGrow) {
     open();
-    auto last = store().currentEventID();
+    auto last = store().barrier();
     ASSERT_TRUE(last);
     for (int i = 0; i < 4; ++i) {
         write("f" + std::to_string(i));
         ASSERT_TRUE(store().reconcile());
-        const auto next = store().currentEventID();
+        const auto next = store().barrier();
         ASSERT_TRUE(next);
         EXPECT_GT(*next, *last);
         last = next;
         reopen();
-        EXPECT_GE(*store().currentEventID(), *last);
+        EXPECT_GE(*store().barrier(), *last);
     }
 }
 
@@ -352,9 +352,9 @@ TEST_P(StoreTest, NothingChangesNoEventIdentifier) {
     open();
     settle();
     ASSERT_TRUE(store().reconcile());
-    const auto before = *store().currentEventID();
+    const auto before = *store().barrier();
     ASSERT_TRUE(store().reconcile());
-    EXPECT_EQ(*store().currentEventID(), before);
+    EXPECT_EQ(*store().barrier(), before);
     EXPECT_EQ(store().report().reconcile.differences, 0U);
 }
 

@@ -1,0 +1,126 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+#include "platform/foundation/Identifiers.h"
+#include "platform/linux/files/PackageTypes.h"
+#include "platform/linux/store/EventBatch.h"
+#include "platform/linux/store/Index.h"
+
+namespace marrowdale::native {
+
+// Makes events of what is done to the index. Whoever brings the index to what is on disk says what
+// it found through here; when all of a batch is done, `flush` turns it into events: what is gone
+// first, then what appeared, changed or was renamed, under the paths that hold at the end.
+//
+// A folder has events of its own for appearing, going, being renamed and for its own metadata; one
+// that moved within the tree has two, and what is in it none. What lies inside a package is a
+// change of the package. One thread at a time, as the index.
+class TreeChanges {
+  public:
+    TreeChanges(Index& index, const PackageTypes& packages) : index_(index), packages_(packages) {}
+
+    // While on, nothing is noted: for a store that is filled for the first time, of which nobody
+    // can have asked before.
+    void setSilent(bool silent) { silent_ = silent; }
+
+    // Of placed rows.
+    void appeared(RowNumber number) { touch(number, Row::touchedAppeared); }
+    void changed(RowNumber number) { touch(number, Row::touchedChanged); }
+    // The document came to rest on another file.
+    void documentMoved(DeviceID device, std::uint32_t document, std::uint64_t from,
+                       std::uint64_t to);
+    // The file of that row had this document and has it no more, and no other file has.
+    void documentGone(RowNumber number, std::uint32_t document);
+
+    // Takes a placed row off its place: it may be found elsewhere before `remove`.
+    void leave(RowNumber number);
+    // Places a row that is in limbo. False when there is no room for the name.
+    [[nodiscard]] bool arrive(RowNumber number, RowNumber folder, std::string_view name);
+    // Frees a row that is in limbo, and all below it.
+    void remove(RowNumber number);
+
+    // A place that a document left, and a place that a moved row came to, since they were last
+    // taken.
+    struct Departure {
+        RowNumber row = noRow;
+        std::uint32_t document = 0;
+        FileID file{};
+        bool isFolder = false;  // a package
+        FileID folder{};
+        std::string name;
+    };
+    struct Arrival {
+        FileID folder{};
+        std::string name;
+        FileID fromFolder{};
+        std::string fromName;
+    };
+    [[nodiscard]] std::vector<Departure> takeDepartures();
+    [[nodiscard]] std::vector<Arrival> takeArrivals();
+
+    // The folders that were freed since this was last asked.
+    [[nodiscard]] std::vector<FileID> takeRemovedFolders();
+
+    // Whether there is something to flush.
+    [[nodiscard]] bool hasChanges() const;
+    // Appends the events of everything noted so far. Rows in limbo stay noted.
+    void flush(EventBatch& batch);
+
+  private:
+    struct Place {
+        std::string path;
+        RowNumber package = noRow;  // the topmost one above
+    };
+    struct Left {
+        Place place;
+        FileID folder{};
+        bool wasPackage = false;
+    };
+    struct Moved {
+        Place from;
+        bool wasPackage = false;
+        std::uint32_t goneDocument = 0;
+    };
+    struct GoneDocument {
+        RowNumber row;
+        std::uint32_t document;
+    };
+    enum class Side : std::uint8_t { gone, appeared };
+
+    void touch(RowNumber number, std::uint32_t bits);
+    [[nodiscard]] Place placeOf(RowNumber number) const;
+    [[nodiscard]] bool isPackage(RowNumber number) const;
+    [[nodiscard]] std::uint32_t kindFlags(RowNumber number) const;
+    // The row's document when no other row has it; the row has none afterwards.
+    [[nodiscard]] std::uint32_t takeDocument(RowNumber number);
+    void putGone(RowNumber number, const std::string& path, std::uint32_t flags,
+                 std::uint32_t document);
+    // Events for what lies below a folder that stands, or stood, at `path`.
+    void putBelow(RowNumber folder, const std::string& path, Side side, bool forgets);
+    void noteRemovedFolders(RowNumber number);
+    void flushRow(RowNumber number, std::uint32_t bits);
+    void flushMove(RowNumber number, const Moved& moved, const Place& now);
+    void flushGoneDocuments();
+    void flushPackages();
+
+    Index& index_;
+    const PackageTypes& packages_;
+    bool silent_ = false;
+    std::vector<RowNumber> touched_;  // have one of the row's touched bits; some may be free by now
+    std::unordered_map<RowNumber, Left> left_;    // in limbo
+    std::unordered_map<RowNumber, Moved> moved_;  // placed again
+    std::vector<RowNumber> packagesChanged_;
+    std::vector<GoneDocument> goneDocuments_;
+    std::vector<Departure> departures_;
+    std::vector<Arrival> arrivals_;
+    std::vector<FileID> removedFolders_;
+    EventBatch gone_;
+    EventBatch rest_;
+};
+
+}  // namespace marrowdale::native
