@@ -1,12 +1,11 @@
 #include "platform/linux/files/EntryStatus.h"
 
-#include <array>
 #include <cerrno>
-#include <cstddef>
-#include <cstring>
 #include <fcntl.h>
 #include <linux/stat.h>
 #include <sys/stat.h>
+
+#include "platform/linux/files/FileHandle.h"
 
 namespace marrowdale::native {
 
@@ -63,42 +62,16 @@ Expected<EntryStatus> statTarget(int directory, const char* name) {
     return entryStatusOf(found);
 }
 
-namespace {
-
-// Each word goes in through a multiplication by an odd number, so two handles that differ in one
-// word (the generation of a reused inode number) never get the same fingerprint.
-std::uint32_t fingerprintOf(int type, const unsigned char* bytes, std::uint32_t count) {
-    std::uint32_t sum = static_cast<std::uint32_t>(type) * 0x9E3779B1U;
-    std::uint32_t factor = 0x85EBCA6BU;
-    for (std::uint32_t at = 0; at < count; at += 4) {
-        std::uint32_t word = 0;
-        std::memcpy(&word, bytes + at, count - at < 4 ? count - at : 4);
-        sum += word * factor;
-        factor = factor * 0xC2B2AE35U + 2U;
-    }
-    sum ^= sum >> 16U;
-    sum *= 0x7FEB352DU;
-    sum ^= sum >> 15U;
-    return sum == 0 ? 1U : sum;
-}
-
-}  // namespace
-
 Expected<std::uint32_t> handleFingerprint(int directory, const char* name) {
-    // The kernel's file_handle with room for every handle there is.
-    alignas(::file_handle) std::array<std::byte, sizeof(::file_handle) + MAX_HANDLE_SZ> room{};
-    auto* handle = reinterpret_cast<::file_handle*>(room.data());
-    handle->handle_bytes = MAX_HANDLE_SZ;
-    int mount = 0;
-    const int flags = *name == '\0' ? AT_EMPTY_PATH : 0;
-    if (::name_to_handle_at(directory, name, handle, &mount, flags) == 0) {
-        return fingerprintOf(handle->handle_type, handle->f_handle, handle->handle_bytes);
+    const Expected<FileHandle> handle = fileHandle(directory, name);
+    if (handle) {
+        return handle->fingerprint();
     }
-    const int code = errno;
+    const int code = handle.error().code;
     if (code == EOPNOTSUPP || code == EOVERFLOW || code == ENOSYS || code == EPERM) {
         return 0U;
     }
-    return Unexpected(errorWithPOSIXCode(code, "get the handle of", name));
+    return Unexpected(handle.error());
 }
 
 bool isSettled(const Date& changed, Date now) {
