@@ -26,6 +26,14 @@ class ByteWriter {
     void append(std::span<const std::byte> bytes) {
         bytes_.insert(bytes_.end(), bytes.begin(), bytes.end());
     }
+    // Seven bits a byte, the lowest first; the top bit says that more follow.
+    void putVarint(std::uint64_t value) {
+        constexpr std::uint64_t more = 0x80;
+        for (; value >= more; value >>= 7U) {
+            put(static_cast<std::uint8_t>(value | more));
+        }
+        put(static_cast<std::uint8_t>(value));
+    }
     // Without a length.
     void text(std::string_view text) { append(std::as_bytes(std::span(text))); }
     void textWithLength(std::string_view value) {
@@ -61,6 +69,24 @@ class ByteReader {
             std::memcpy(&value, part.data(), sizeof value);
         }
         return value;
+    }
+    // What `putVarint` put; `ok` is false when it does not end, or is no 64-bit number.
+    [[nodiscard]] std::uint64_t takeVarint() {
+        constexpr unsigned lastShift = 63;
+        std::uint64_t value = 0;
+        for (unsigned shift = 0; shift <= lastShift; shift += 7) {
+            const auto byte = take<std::uint8_t>();
+            if (shift == lastShift && byte > 1) {
+                break;
+            }
+            value |= std::uint64_t{byte & 0x7FU} << shift;
+            if ((byte & 0x80U) == 0) {
+                return value;
+            }
+        }
+        ok_ = false;
+        left_ = {};
+        return 0;
     }
     // Empty when there are fewer left.
     [[nodiscard]] std::span<const std::byte> takeBytes(std::size_t count) {

@@ -34,6 +34,7 @@ struct SegmentHeader {
     std::uint64_t number = 0;
     std::uint64_t firstSequence = 0;
     std::uint64_t lastEventBefore = 0;
+    std::uint32_t created = 0;  // seconds since 1970, as the clock stood
 };
 
 }  // namespace marrowdale::native

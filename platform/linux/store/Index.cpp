@@ -160,7 +160,7 @@ RowNumber Index::fill(RowNumber folder, std::string_view name, const Row& values
     }
     ++count_;
     insertFile(number);
-    markDirty(number);
+    markRenewed(number);
     return number;
 }
 
@@ -289,7 +289,7 @@ void Index::putInLimbo(RowNumber number) {
         });
     }
     limbo_.push_back(number);
-    markDirty(number);
+    markRenewed(number);
 }
 
 bool Index::place(RowNumber number, RowNumber folder, std::string_view name) {
@@ -306,7 +306,7 @@ bool Index::place(RowNumber number, RowNumber folder, std::string_view name) {
     entry.set(Row::limbo, false);
     link(number);
     insertName(number);
-    markDirty(number);
+    markRenewed(number);
     return true;
 }
 
@@ -330,7 +330,7 @@ void Index::setDocument(RowNumber number, std::uint32_t document) {
     if (document != 0) {
         insertDocument(number);
     }
-    markDirty(number);
+    markRenewed(number);
 }
 
 void Index::remove(RowNumber number) {
@@ -376,9 +376,14 @@ void Index::markDirty(RowNumber number) {
     }
 }
 
+void Index::markRenewed(RowNumber number) {
+    markDirty(number);
+    row(number).set(Row::renewed, true);
+}
+
 void Index::clearDirty() {
     for (const RowNumber number : dirty_) {
-        row(number).set(Row::dirty, false);
+        row(number).set(Row::dirty | Row::renewed, false);
     }
     std::vector<RowNumber>().swap(dirty_);  // an assignment would keep the memory
 }

@@ -68,12 +68,16 @@ class Index {
     void remove(RowNumber number);
 
     void markDirty(RowNumber number);
-    // The rows that were made, changed or freed since `clearDirty`, each once.
+    // The rows that were made, changed or freed since `clearDirty`, each once. Those of which more
+    // changed than `update` sets have the flag Row::renewed.
     [[nodiscard]] const std::vector<RowNumber>& dirty() const { return dirty_; }
     void clearDirty();
 
     // Loading: raw rows first, in any order, then everything else is made of them.
     void restoreRow(RowNumber number, const Row& values, std::string_view name);
+    // What `update` sets, for a row that was restored before. False when there is none of that
+    // kind.
+    [[nodiscard]] bool restoreTouch(RowNumber number, const Row& values);
     void freeRestoredRow(RowNumber number);
     // Room for a chunk's worth of rows that the caller fills, in order from row 0.
     [[nodiscard]] Row* addRawRows(RowNumber count);
@@ -104,6 +108,7 @@ class Index {
     void insertDocument(RowNumber number);
     void removeDocument(RowNumber number);
     void freeRow(RowNumber number);
+    void markRenewed(RowNumber number);
     [[nodiscard]] bool isGoodRow(RowNumber number) const;
     [[nodiscard]] bool linkRestored();
     [[nodiscard]] bool indexRestored();

@@ -26,6 +26,19 @@ void Index::restoreRow(RowNumber number, const Row& values, std::string_view nam
     entry.name = name.empty() ? NameArena::noName : names_.add(name);
 }
 
+bool Index::restoreTouch(RowNumber number, const Row& values) {
+    if (number >= endOfRows_ || row(number).isFree() || row(number).kind() != values.kind()) {
+        return false;
+    }
+    Row& entry = row(number);
+    entry.flags = values.flags;
+    entry.changed = values.changed;
+    entry.size = values.size;
+    entry.fingerprint = values.fingerprint;
+    entry.attributes = values.attributes;
+    return true;
+}
+
 void Index::freeRestoredRow(RowNumber number) {
     names_.remove(row(number).name);
     row(number) = Row{};

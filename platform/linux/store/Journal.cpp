@@ -2,9 +2,12 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <limits>
+#include <string_view>
 #include <utility>
 
 #include "platform/linux/store/Bytes.h"
+#include "platform/services/FileEventService.h"
 
 namespace marrowdale::native {
 
@@ -20,7 +23,9 @@ class FrameStream {
         : writer_(writer), sequence_(sequence), lastEvent_(lastEvent) {}
 
     [[nodiscard]] ByteWriter& records() { return records_; }
-    // The record that was put stands for an event of its own.
+    // Cuts off what is too long to be looked at by path anyway: the folder changed.
+    void putEvent(const StoredEvent& event);
+    // The record that was put has an event identifier of its own.
     void countEvent() {
         ++lastEvent_;
         header_.firstEvent = header_.firstEvent == 0 ? lastEvent_ : header_.firstEvent;
@@ -41,25 +46,52 @@ class FrameStream {
         auto written = writer_.append(header_, records_.bytes());
         header_ = {};
         records_.clear();
+        path_.clear();
         return written;
     }
 
     SegmentWriter& writer_;
     ByteWriter records_;
+    std::string path_;  // of the last event in the frame
     FrameHeader header_;
     std::uint64_t sequence_;
     std::uint64_t lastEvent_;
 };
+
+void FrameStream::putEvent(const StoredEvent& event) {
+    StoredEvent fitting = event;
+    if (event.path.size() > longestEventPath) {
+        const std::size_t end = event.path.substr(0, longestEventPath + 1).rfind('/');
+        fitting.path = event.path.substr(0, end == std::string_view::npos ? 0 : end);
+        fitting.flags = FileEventFlag::changed | FileEventFlag::isFolder;
+        fitting.fileID = {};
+    }
+    native::putEvent(records_, fitting, path_);
+    path_ = fitting.path;
+    countEvent();
+}
+
+Expected<void> putEvents(FrameStream& out, const EventBatch& events) {
+    Expected<void> done;
+    events.forEach([&](const StoredEvent& event) {
+        if (done) {
+            out.putEvent(event);
+            done = out.endRecord();
+        }
+    });
+    return done;
+}
 
 Expected<void> putDirtyRows(FrameStream& out, const Index& index) {
     for (const RowNumber number : index.dirty()) {
         const Row& row = index.row(number);
         if (row.isFree()) {
             putRemoval(out.records(), number);
-        } else {
+        } else if (row.has(Row::renewed)) {
             putRow(out.records(), number, row, index.name(number));
+        } else {
+            putTouch(out.records(), number, row);
         }
-        out.countEvent();
         if (auto done = out.endRecord(); !done) {
             return done;
         }
@@ -68,6 +100,12 @@ Expected<void> putDirtyRows(FrameStream& out, const Index& index) {
 }
 
 }  // namespace
+
+Journal::Journal(const StoreFolder& folder, StoreIdentity identity, Options options)
+    : folder_(folder),
+      identity_(std::move(identity)),
+      options_(std::move(options)),
+      log_(std::make_shared<LogView>(folder_, identity_.uuid)) {}
 
 bool Journal::hasChanges(const Index& index, const EventBatch& events,
                          std::uint32_t lastDocument) const {
@@ -81,14 +119,16 @@ Expected<void> Journal::commit(Index& index, EventBatch& events, std::uint32_t l
     if (failure_) {
         return Unexpected(*failure_);
     }
-    const std::uint64_t count = index.dirty().size() + (gapIsNew_ ? 1U : 0U);
+    const std::uint64_t count = events.count() + (gapIsNew_ ? 1U : 0U);
     if (auto reserved = range_.reserve(lastEvent_ + count, lastDocument); !reserved) {
         return reserved;
     }
     if (writer_.offset() > segmentLimit) {
+        trim();  // first, so that a full disk gets room
         if (auto rolled = rollSegment(); !rolled) {
             return rolled;
         }
+        trim();
     }
     if (auto written = writeCommit(index, events, lastDocument); !written) {
         return written;
@@ -99,7 +139,7 @@ Expected<void> Journal::commit(Index& index, EventBatch& events, std::uint32_t l
     return {};
 }
 
-Expected<void> Journal::writeCommit(const Index& index, const EventBatch& /*events*/,
+Expected<void> Journal::writeCommit(const Index& index, const EventBatch& events,
                                     std::uint32_t lastDocument) {
     const std::uint64_t start = writer_.offset();
     FrameStream out(writer_, sequence_, lastEvent_);
@@ -113,6 +153,7 @@ Expected<void> Journal::writeCommit(const Index& index, const EventBatch& /*even
         putDocumentCounter(out.records(), lastDocument);
         done = out.endRecord();
     }
+    done = done ? putEvents(out, events) : done;
     done = done ? putDirtyRows(out, index) : done;
     done = done ? out.finish() : done;
     if (!done) {
@@ -129,7 +170,11 @@ Expected<void> Journal::writeCommit(const Index& index, const EventBatch& /*even
     sequence_ = out.sequence();
     lastEvent_ = out.lastEvent();
     lastDocument_ = lastDocument;
-    return writeHead();
+    if (auto written = writeHead(); !written) {
+        return written;
+    }
+    log_->advance(writer_.offset(), sequence_, lastEvent_);
+    return {};
 }
 
 Expected<void> Journal::writeHead() {
@@ -148,13 +193,13 @@ Expected<void> Journal::writeHead() {
 }
 
 Expected<void> Journal::rollSegment() {
-    auto next = SegmentWriter::create(folder_.store(), identity_.uuid,
-                                      {writer_.number() + 1, sequence_ + 1, lastEvent_});
+    const SegmentHeader header{writer_.number() + 1, sequence_ + 1, lastEvent_, seconds()};
+    auto next = SegmentWriter::create(folder_.store(), identity_.uuid, header);
     if (!next) {
         return Unexpected(next.error());
     }
-    olderLogBytes_ += writer_.offset();
     writer_ = std::move(*next);
+    log_->begin(header, writer_.offset());
     return writeHead();
 }
 
@@ -166,8 +211,8 @@ Expected<void> Journal::writeSnapshot(Index& index) {
     if (failure_) {
         return Unexpected(*failure_);
     }
-    // Even where there is no room for another snapshot, what the last one covers can go.
-    removeOldSegments();
+    // Even where there is no room for another snapshot.
+    trim();
     if (writer_.offset() > segmentHeaderSize) {
         if (auto rolled = rollSegment(); !rolled) {
             return rolled;
@@ -182,18 +227,47 @@ Expected<void> Journal::writeSnapshot(Index& index) {
     }
     snapshotBytes_ = *bytes;
     snapshotSegment_ = writer_.number();
-    removeOldSegments();
-    olderLogBytes_ = 0;
+    trim();
     return {};
 }
 
-void Journal::removeOldSegments() {
+std::uint64_t Journal::logBytes() const {
+    std::uint64_t bytes = 0;
+    for (const LogView::Segment& segment : log_->segments()) {
+        bytes += segment->header.number >= snapshotSegment_ ? segment->end.load() : 0;
+    }
+    return bytes;
+}
+
+std::uint32_t Journal::seconds() const {
+    constexpr std::int64_t most = std::numeric_limits<std::uint32_t>::max();
+    return static_cast<std::uint32_t>(std::clamp<std::int64_t>(options_.clock().seconds, 0, most));
+}
+
+void Journal::trim() {
+    const auto segments = log_->segments();
+    std::vector<SegmentAge> ages;
+    std::size_t needed = 0;
+    for (std::size_t i = 0; i < segments.size(); ++i) {
+        const std::uint64_t lastEvent =
+            i + 1 < segments.size() ? segments[i + 1]->header.lastEventBefore : lastEvent_;
+        ages.push_back(
+            {segments[i]->header.created, log_->eventsBehind(lastEvent), segments[i]->end.load()});
+        needed += segments[i]->header.number >= snapshotSegment_ ? 1U : 0U;
+    }
+    const std::size_t surplus = surplusSegments(ages, needed, options_.retention, seconds());
+    const std::uint64_t oldest = segments[surplus]->header.number;
+    log_->removeBefore(oldest);
+    removeSegmentsBefore(oldest);
+}
+
+void Journal::removeSegmentsBefore(std::uint64_t oldest) const {
     const auto numbers = folder_.segments();
     if (!numbers) {
         return;  // they are removed another time
     }
     for (const std::uint64_t number : *numbers) {
-        if (number < snapshotSegment_) {
+        if (number < oldest) {
             (void)removeFile(folder_.segment(number));
         }
     }

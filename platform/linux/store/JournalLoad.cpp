@@ -34,12 +34,15 @@ bool applyRecord(const Record& record, Index& index, std::vector<EventGap>& gaps
             }
             index.freeRestoredRow(record.row);
             return true;
+        case Record::Type::rowTouched:
+            return index.restoreTouch(record.row, record.values);
         case Record::Type::gap:
             gaps.push_back(record.gap);
             return true;
         case Record::Type::documentCounter:
             lastDocument = std::max(lastDocument, record.document);
             return true;
+        case Record::Type::event:
         case Record::Type::passedOver:
             return true;
     }
@@ -56,13 +59,14 @@ struct Journal::Replay {
     std::vector<std::byte> open;  // records of a commit whose end was not met yet
     std::uint64_t openSequence = 0;
     std::uint64_t openLastEvent = 0;
-    std::vector<std::pair<std::uint64_t, std::uint64_t>> passed;  // earlier segments and lengths
+    std::vector<std::pair<SegmentHeader, std::uint64_t>> met;  // segments and where they end
 };
 
 Expected<std::unique_ptr<Journal>> Journal::load(const StoreFolder& folder,
                                                  const StoreIdentity& identity,
-                                                 const std::string& cacheFolder, Index& index) {
-    std::unique_ptr<Journal> journal(new Journal(folder, identity));
+                                                 const std::string& cacheFolder, Index& index,
+                                                 Options options) {
+    std::unique_ptr<Journal> journal(new Journal(folder, identity, std::move(options)));
     auto done = journal->openSmallFiles(cacheFolder);
     done = done ? journal->loadSnapshot(index) : done;
     done = done ? journal->replayLog(index) : done;
@@ -145,7 +149,6 @@ Expected<void> Journal::replayLog(Index& index) {
         if (!*goesOn) {
             break;
         }
-        replay.passed.emplace_back(replay.segment, replay.goodEnd);
         ++replay.segment;
         replay.goodEnd = 0;
     }
@@ -176,6 +179,7 @@ Expected<bool> Journal::replaySegment(Replay& replay, Index& index) {
         return Unexpected(damageOf(path, "it does not follow the one before"));
     }
     replay.goodEnd = segmentHeaderSize;
+    replay.met.emplace_back(reader->segment(), segmentHeaderSize);
     auto step = reader->next();
     for (; step && *step == SegmentReader::Step::frame; step = reader->next()) {
         const FrameHeader& header = reader->header();
@@ -192,6 +196,7 @@ Expected<bool> Journal::replaySegment(Replay& replay, Index& index) {
                 return Unexpected(damageOf(path, "a record of a wrong shape"));
             }
             replay.goodEnd = reader->offset();
+            replay.met.back().second = replay.goodEnd;
         }
     }
     if (!step) {
@@ -239,34 +244,68 @@ Expected<void> Journal::checkReach(const Replay& replay) const {
 
 Expected<void> Journal::startWriting(const Replay& replay) {
     sequence_ = replay.sequence;
-    // The last segment may be one whose header never reached the disk: the one before goes on.
-    auto [segment, end] = std::pair(replay.segment, replay.goodEnd);
-    auto passed = replay.passed;
-    if (end == 0) {
-        std::tie(segment, end) = passed.back();
-        passed.pop_back();
+    const auto older = olderSegments(replay.met.front().first);
+    if (!older) {
+        return Unexpected(older.error());
     }
+    for (const auto& [header, end] : *older) {
+        log_->begin(header, end);
+    }
+    for (const auto& [header, end] : replay.met) {
+        log_->begin(header, end);
+    }
+    // Behind it there may be one whose header never reached the disk.
+    const auto& [last, end] = replay.met.back();
     const auto numbers = folder_.segments();
     if (!numbers) {
         return Unexpected(numbers.error());
     }
     for (const std::uint64_t number : *numbers) {
-        if (number > segment) {
+        if (number > last.number) {
             if (auto removed = removeFile(folder_.segment(number)); !removed) {
                 return removed;
             }
         }
     }
-    for (const auto& earlier : passed) {
-        olderLogBytes_ += earlier.second;
-    }
-    auto writer = SegmentWriter::resume(folder_.store(), segment, end);
+    auto writer = SegmentWriter::resume(folder_.store(), last.number, end);
     if (!writer) {
         return Unexpected(writer.error());
     }
     writer_ = std::move(*writer);
-    removeOldSegments();
+    log_->advance(end, sequence_, lastEvent_);
     return writeHead();
+}
+
+// The segments that only history needs. Where one is missing or damaged, history begins behind it:
+// that costs those a fresh start who read from further back, and nobody an identifier.
+Expected<std::vector<std::pair<SegmentHeader, std::uint64_t>>> Journal::olderSegments(
+    const SegmentHeader& first) {
+    std::vector<std::pair<SegmentHeader, std::uint64_t>> older;
+    SegmentHeader next = first;
+    while (next.number > 1) {
+        const std::string path = folder_.segment(next.number - 1);
+        const auto reader = SegmentReader::open(path, identity_.uuid, next.number - 1);
+        if (!reader && reader.error().code == ENOENT) {
+            break;  // it was given up
+        }
+        const bool fits = reader && reader->segment().firstSequence <= next.firstSequence &&
+                          reader->segment().lastEventBefore <= next.lastEventBefore;
+        if (!fits && (reader || isDamage(reader.error()))) {
+            historyProblem_ =
+                (reader ? damageOf(path, "it does not go with the one behind it") : reader.error())
+                    .description();
+            break;
+        }
+        const auto size =
+            reader ? reader->fileSize() : Expected<std::uint64_t>(Unexpected(reader.error()));
+        if (!size) {
+            return Unexpected(size.error());
+        }
+        next = reader->segment();
+        older.emplace_back(next, *size);
+    }
+    std::ranges::reverse(older);
+    return older;
 }
 
 void Journal::noteGap() {
@@ -277,6 +316,8 @@ void Journal::noteGap() {
     }
     documentFloor_ = range_.documentEnd();
     trimGaps();
+    log_->setGaps(gaps_, lastEvent_);
+    trim();
 }
 
 void Journal::trimGaps() {

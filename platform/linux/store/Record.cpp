@@ -1,11 +1,16 @@
 #include "platform/linux/store/Record.h"
 
+#include <algorithm>
+#include <bit>
+#include <limits>
+
 namespace marrowdale::native {
 
 namespace {
 
 constexpr std::uint32_t headSize = 4;
 constexpr std::uint32_t rowBodySize = 56;
+constexpr std::uint32_t touchBodySize = 32;
 
 void putHead(ByteWriter& out, Record::Type type, std::size_t bodySize) {
     const auto length = static_cast<std::uint32_t>(bodySize) + headSize;
@@ -33,6 +38,37 @@ bool takeRow(ByteReader& body, Record& record) {
            record.name.empty() == (record.row == rootRow);
 }
 
+bool takeTouch(ByteReader& body, Record& record) {
+    Row& row = record.values;
+    record.row = body.take<RowNumber>();
+    row.flags = body.take<std::uint32_t>();
+    row.changed = body.take<std::int64_t>();
+    row.size = body.take<std::uint64_t>();
+    row.fingerprint = body.take<std::uint32_t>();
+    row.attributes = body.take<std::uint32_t>();
+    return body.finished() && isRowNumber(record.row) && !row.isFree();
+}
+
+// The flags of an item begin at bit 16, so turned by that much they mostly are one byte. The bit
+// below them says that a document is gone.
+constexpr int flagTurn = 16;
+
+bool takeEvent(ByteReader& body, Record& record) {
+    StoredEvent& event = record.event;
+    const std::uint64_t head = body.takeVarint();
+    const std::uint64_t turned = head >> 1U;
+    event.flags = std::rotl(static_cast<std::uint32_t>(turned), flagTurn);
+    event.fileID = FileID{body.takeVarint()};
+    const std::uint64_t gone = (head & 1U) != 0 ? body.takeVarint() : 0;
+    event.goneDocument = DocumentID{static_cast<std::uint32_t>(gone)};
+    record.shared = body.takeVarint();
+    event.path = body.rest();
+    constexpr std::uint64_t most = std::numeric_limits<std::uint32_t>::max();
+    return body.ok() && turned <= most && gone <= most && (gone != 0) == ((head & 1U) != 0) &&
+           record.shared <= longestEventPath &&
+           event.path.size() <= longestEventPath - record.shared;
+}
+
 bool takeBody(ByteReader& body, Record& record) {
     switch (record.type) {
         case Record::Type::rowPut:
@@ -47,6 +83,10 @@ bool takeBody(ByteReader& body, Record& record) {
         case Record::Type::documentCounter:
             record.document = body.take<std::uint32_t>();
             return body.finished();
+        case Record::Type::rowTouched:
+            return takeTouch(body, record);
+        case Record::Type::event:
+            return takeEvent(body, record);
         case Record::Type::passedOver:
             break;
     }
@@ -55,12 +95,15 @@ bool takeBody(ByteReader& body, Record& record) {
 
 std::optional<Record::Type> typeOf(std::uint32_t number) {
     constexpr std::uint32_t lastPassedOver = 0x7F;
+    if (number == static_cast<std::uint32_t>(Record::Type::event)) {
+        return Record::Type::event;
+    }
     if (number >= static_cast<std::uint32_t>(Record::Type::passedOver) &&
         number <= lastPassedOver) {
         return Record::Type::passedOver;
     }
     if (number >= static_cast<std::uint32_t>(Record::Type::rowPut) &&
-        number <= static_cast<std::uint32_t>(Record::Type::documentCounter)) {
+        number <= static_cast<std::uint32_t>(Record::Type::rowTouched)) {
         return static_cast<Record::Type>(number);
     }
     return std::nullopt;
@@ -83,6 +126,16 @@ void putRow(ByteWriter& out, RowNumber number, const Row& row, std::string_view 
     out.text(name);
 }
 
+void putTouch(ByteWriter& out, RowNumber number, const Row& row) {
+    putHead(out, Record::Type::rowTouched, touchBodySize);
+    out.put(number);
+    out.put(row.flags & Row::lastingFlags);
+    out.put(row.changed);
+    out.put(row.isFolder() ? std::uint64_t{0} : row.size);
+    out.put(row.fingerprint);
+    out.put(row.attributes);
+}
+
 void putRemoval(ByteWriter& out, RowNumber number) {
     putHead(out, Record::Type::rowRemoved, sizeof number);
     out.put(number);
@@ -97,6 +150,23 @@ void putGap(ByteWriter& out, const EventGap& gap) {
 void putDocumentCounter(ByteWriter& out, std::uint32_t last) {
     putHead(out, Record::Type::documentCounter, sizeof last);
     out.put(last);
+}
+
+void putEvent(ByteWriter& out, const StoredEvent& event, std::string_view before) {
+    const auto shared = static_cast<std::size_t>(std::ranges::mismatch(event.path, before).in1 -
+                                                 event.path.begin());
+    const std::uint32_t gone = raw(event.goneDocument);
+    const std::size_t start = out.size();
+    putHead(out, Record::Type::event, 0);
+    out.putVarint(std::uint64_t{std::rotr(event.flags, flagTurn)} << 1U | (gone != 0 ? 1U : 0U));
+    out.putVarint(raw(event.fileID));
+    if (gone != 0) {
+        out.putVarint(gone);
+    }
+    out.putVarint(shared);
+    out.text(event.path.substr(shared));
+    const auto length = static_cast<std::uint32_t>(out.size() - start);
+    out.putAt(start, static_cast<std::uint32_t>(Record::Type::event) | length << 8U);
 }
 
 std::optional<Record> RecordReader::next() {

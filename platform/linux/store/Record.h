@@ -7,6 +7,7 @@
 #include <string_view>
 
 #include "platform/linux/store/Bytes.h"
+#include "platform/linux/store/EventBatch.h"
 #include "platform/linux/store/Row.h"
 
 namespace marrowdale::native {
@@ -24,20 +25,32 @@ struct Record {
         rowRemoved = 0x02,
         gap = 0x03,
         documentCounter = 0x04,
-        passedOver = 0x40,  // and up to 0x7F: nothing of the index
+        rowTouched = 0x05,
+        event = 0x40,
+        passedOver = 0x41,  // and up to 0x7F: nothing of the index
     };
     Type type = Type::passedOver;
-    RowNumber row = noRow;       // rowPut, rowRemoved
-    Row values{};                // rowPut
+    RowNumber row = noRow;       // rowPut, rowRemoved, rowTouched
+    Row values{};                // rowPut; rowTouched: what Index::update sets
     std::string_view name;       // rowPut; lies in the bytes that were read
     EventGap gap;                // gap
     std::uint32_t document = 0;  // documentCounter
+    // event, without its identifier; the path is what follows the first `shared` bytes of the path
+    // of the event before it in the frame, and lies in the bytes that were read.
+    StoredEvent event;
+    std::uint64_t shared = 0;
 };
 
 void putRow(ByteWriter& out, RowNumber number, const Row& row, std::string_view name);
+void putTouch(ByteWriter& out, RowNumber number, const Row& row);
 void putRemoval(ByteWriter& out, RowNumber number);
 void putGap(ByteWriter& out, const EventGap& gap);
 void putDocumentCounter(ByteWriter& out, std::uint32_t last);
+
+// No event has a longer path.
+inline constexpr std::size_t longestEventPath = 0xFFFF;
+// `before` is the path of the event before it in the same frame; empty for the first.
+void putEvent(ByteWriter& out, const StoredEvent& event, std::string_view before);
 
 // Takes the records of one frame apart.
 class RecordReader {

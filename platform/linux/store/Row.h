@@ -32,6 +32,8 @@ struct alignas(64) Row {
     static constexpr std::uint32_t touchedAppeared = 1U << 29U;
     static constexpr std::uint32_t touchedChanged = 1U << 30U;
     static constexpr std::uint32_t touchedRenamed = 1U << 31U;
+    // Dirty, and more than `Index::update` changes: place, name, file or document.
+    static constexpr std::uint32_t renewed = 1U << 28U;
     static constexpr std::uint32_t ageShift = 8;
     static constexpr std::uint32_t ageLimit = 0xFFFF;
 

@@ -12,8 +12,6 @@ namespace marrowdale::native {
 
 namespace {
 
-constexpr std::size_t readAhead = 1U << 20U;
-
 Expected<SegmentHeader> checkHeader(std::span<const std::byte> bytes, const std::string& path,
                                     const UUID& store, std::uint64_t number) {
     if (bytes.size() < segmentHeaderSize) {
@@ -28,7 +26,7 @@ Expected<SegmentHeader> checkHeader(std::span<const std::byte> bytes, const std:
     header.number = in.take<std::uint64_t>();
     header.firstSequence = in.take<std::uint64_t>();
     header.lastEventBefore = in.take<std::uint64_t>();
-    (void)in.take<std::uint32_t>();
+    header.created = in.take<std::uint32_t>();
     if (!sameMagic || in.take<std::uint32_t>() != crc32c(bytes.first(segmentHeaderSize - 4))) {
         return Unexpected(damageOf(path, "its header's checksum does not hold"));
     }
@@ -65,9 +63,15 @@ Expected<SegmentReader> SegmentReader::open(const std::string& path, const UUID&
 }
 
 Expected<std::span<const std::byte>> SegmentReader::peek(std::size_t count) {
+    const std::uint64_t left = limit_ - std::min(offset_, limit_);
+    count = static_cast<std::size_t>(std::min<std::uint64_t>(count, left));
+    if (count == 0) {
+        return std::span<const std::byte>();
+    }
     const std::uint64_t bufferEnd = bufferStart_ + buffer_.size();
     if (offset_ + count > bufferEnd || offset_ < bufferStart_) {
-        buffer_.resize(std::max(count, readAhead));
+        buffer_.resize(
+            static_cast<std::size_t>(std::min<std::uint64_t>(std::max(count, readAhead_), left)));
         bufferStart_ = offset_;
         const auto filled = file_.read(buffer_, offset_);
         if (!filled) {
@@ -79,7 +83,13 @@ Expected<std::span<const std::byte>> SegmentReader::peek(std::size_t count) {
     return all.first(std::min(count, all.size()));
 }
 
-Expected<SegmentReader::Step> SegmentReader::next() {
+void SegmentReader::releaseBuffer() {
+    records_ = {};
+    std::vector<std::byte>().swap(buffer_);
+    bufferStart_ = offset_;
+}
+
+Expected<SegmentReader::Step> SegmentReader::nextHeader() {
     const auto head = peek(frameHeaderSize);
     if (!head) {
         return Unexpected(head.error());
@@ -92,30 +102,45 @@ Expected<SegmentReader::Step> SegmentReader::next() {
     }
     ByteReader in(*head);
     const bool sameMagic = in.take<FrameMagic>() == frameMagic;
-    const auto length = in.take<std::uint32_t>();
+    length_ = in.take<std::uint32_t>();
     header_.sequence = in.take<std::uint64_t>();
     header_.firstEvent = in.take<std::uint64_t>();
     header_.lastEvent = in.take<std::uint64_t>();
     header_.recordCount = in.take<std::uint32_t>();
     header_.flags = in.take<std::uint32_t>();
-    const auto recordsChecksum = in.take<std::uint32_t>();
+    recordsChecksum_ = in.take<std::uint32_t>();
     const bool holds = in.take<std::uint32_t>() == crc32c(head->first(frameHeaderSize - 4));
-    if (!sameMagic || !holds || length > largestFrame) {
-        return Step::bad;
-    }
-    const auto whole = peek(frameHeaderSize + length);
+    return sameMagic && holds && length_ <= largestFrame ? Step::frame : Step::bad;
+}
+
+Expected<SegmentReader::Step> SegmentReader::takeRecords() {
+    const auto whole = peek(frameHeaderSize + length_);
     if (!whole) {
         return Unexpected(whole.error());
     }
-    if (whole->size() < frameHeaderSize + length) {
+    if (whole->size() < frameHeaderSize + length_) {
         return Step::bad;
     }
     records_ = whole->subspan(frameHeaderSize);
-    if (crc32c(records_) != recordsChecksum) {
+    if (crc32c(records_) != recordsChecksum_) {
         return Step::bad;
     }
-    offset_ += frameHeaderSize + length;
+    offset_ += frameHeaderSize + length_;
     return Step::frame;
+}
+
+SegmentReader::Step SegmentReader::skipRecords() {
+    const std::uint64_t end = offset_ + frameHeaderSize + length_;
+    if (end > limit_) {
+        return Step::bad;
+    }
+    offset_ = end;
+    return Step::frame;
+}
+
+Expected<SegmentReader::Step> SegmentReader::next() {
+    auto step = nextHeader();
+    return step && *step == Step::frame ? takeRecords() : step;
 }
 
 }  // namespace marrowdale::native

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <span>
 #include <string>
 #include <vector>
@@ -27,8 +29,23 @@ class SegmentReader {
                                                       std::uint64_t number);
 
     [[nodiscard]] const SegmentHeader& segment() const { return segment_; }
+    [[nodiscard]] Expected<std::uint64_t> fileSize() const { return file_.size(); }
+    // Nothing at this offset or behind it is looked at.
+    void limitTo(std::uint64_t offset) { limit_ = offset; }
+    // Goes on at this offset, where a frame begins.
+    void seek(std::uint64_t offset) { offset_ = offset; }
+    // How much is read at once; 1 MiB at first.
+    void setReadAhead(std::size_t bytes) { readAhead_ = bytes; }
+    // Gives the memory of what was read back.
+    void releaseBuffer();
+
     // Errors: the system's alone.
     [[nodiscard]] Expected<Step> next();
+    // The same in two steps: the header, and then either the records or not.
+    [[nodiscard]] Expected<Step> nextHeader();
+    [[nodiscard]] Expected<Step> takeRecords();
+    // Bad when they go beyond the limit. Whether the file is that long shows at the next step.
+    [[nodiscard]] Step skipRecords();
     // The frame of the last step; good until the next.
     [[nodiscard]] const FrameHeader& header() const { return header_; }
     [[nodiscard]] std::span<const std::byte> records() const { return records_; }
@@ -36,7 +53,7 @@ class SegmentReader {
     [[nodiscard]] std::uint64_t offset() const { return offset_; }
 
   private:
-    // At least `count` bytes from `offset_` on, or fewer at the end of the file.
+    // `count` bytes from `offset_` on, or fewer at the end of the file or the limit.
     [[nodiscard]] Expected<std::span<const std::byte>> peek(std::size_t count);
 
     DiskFile file_;
@@ -46,6 +63,10 @@ class SegmentReader {
     std::vector<std::byte> buffer_;
     std::uint64_t bufferStart_ = 0;
     std::uint64_t offset_ = segmentHeaderSize;
+    std::uint64_t limit_ = std::numeric_limits<std::uint64_t>::max();
+    std::size_t readAhead_ = 1U << 20U;
+    std::uint32_t length_ = 0;  // of the records behind `header_`
+    std::uint32_t recordsChecksum_ = 0;
 };
 
 }  // namespace marrowdale::native

@@ -33,7 +33,7 @@ Expected<SegmentWriter> SegmentWriter::create(const std::string& folder, const U
     out.put(header.number);
     out.put(header.firstSequence);
     out.put(header.lastEventBefore);
-    out.put(std::uint32_t{0});
+    out.put(header.created);
     out.put(crc32c(out.bytes()));
     if (auto written = file->write(out.bytes(), 0); !written) {
         return Unexpected(written.error());

@@ -43,6 +43,12 @@ StoreReport Store::Core::report() {
     report.logBytes = journal_->logBytes();
     report.snapshotBytes = journal_->snapshotBytes();
     report.lastEventID = EventID{journal_->lastEvent()};
+    const LogView::Extent history = journal_->log()->extent();
+    report.oldestEventID = EventID{history.lastEventBefore + 1};
+    report.oldestEventDate = {history.created, 0};
+    report.events = history.events;
+    report.historyBytes = history.bytes;
+    report.historyProblem = journal_->historyProblem();
     report.documentIDsUsed = lastDocument_ - (identity_.firstDocument - 1);
     report.documentIDsLeft = std::numeric_limits<std::uint32_t>::max() - lastDocument_;
     report.writeError = writeError_;

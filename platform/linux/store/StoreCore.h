@@ -171,6 +171,7 @@ class Store::Core {
     const StoreFolder folder_;
     const std::string rootPath_;
     Log* const log_;
+    const Journal::Options journalOptions_;
     const StoreLock lock_;
     const UniqueFD root_;
     DeviceID device_{};  // set while opening, as are those below

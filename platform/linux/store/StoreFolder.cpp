@@ -98,7 +98,9 @@ Expected<void> StoreFolder::create(const StoreIdentity& identity) const {
     if (auto synced = head->sync(); !synced) {
         return synced;
     }
-    const auto segment = SegmentWriter::create(folder, identity.uuid, {1, 1, 0});
+    constexpr std::int64_t billion = 1'000'000'000;
+    const auto created = static_cast<std::uint32_t>(identity.created / billion);
+    const auto segment = SegmentWriter::create(folder, identity.uuid, {1, 1, 0, created});
     if (!segment) {
         return Unexpected(segment.error());
     }

@@ -35,6 +35,7 @@ Store::Core::Core(const StoreOptions& options, StateFolder state, StoreFolder fo
       folder_(std::move(folder)),
       rootPath_(options.rootPath),
       log_(options.log),
+      journalOptions_{options.retention, options.clock},
       lock_(std::move(lock)),
       root_(std::move(root)),
       packages_(options.packages != nullptr ? *options.packages : PackageTypes()),
@@ -212,7 +213,7 @@ void Store::Core::noteRoot(const RootBinding& root) {
 }
 
 Expected<void> Store::Core::loadJournal() {
-    auto journal = Journal::load(folder_, identity_, cacheFolder_, index_);
+    auto journal = Journal::load(folder_, identity_, cacheFolder_, index_, journalOptions_);
     if (!journal) {
         return Unexpected(journal.error());
     }

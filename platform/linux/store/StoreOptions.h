@@ -2,12 +2,15 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <string>
 
+#include "platform/foundation/Date.h"
 #include "platform/foundation/Log.h"
 #include "platform/linux/events/Watcher.h"
 #include "platform/linux/files/PackageTypes.h"
+#include "platform/linux/store/Retention.h"
 
 namespace marrowdale::native {
 
@@ -39,6 +42,10 @@ struct StoreOptions {
     // Which folders are packages; null: those that are whatever applications say. Must outlive the
     // store.
     const PackageTypes* packages = nullptr;
+    // How much history is kept.
+    Retention retention = {};
+    // Says how old history is.
+    std::function<Date()> clock = Date::now;
 };
 
 }  // namespace marrowdale::native

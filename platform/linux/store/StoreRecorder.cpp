@@ -101,13 +101,12 @@ EventID Store::Core::lastEventID() {
 
 EventHistory::Standing Store::Core::standingOf(EventID since) {
     const MutexLock lock(mutex_);
-    (void)since;
-    return EventHistory::Standing::good;  // XXX
+    return journal_->standingOf(since);
 }
 
 Expected<std::unique_ptr<EventCursor>> Store::Core::eventsSince(EventID since) {
     const MutexLock lock(mutex_);
-    return Unexpected(errorWithPOSIXCode(ENOTSUP, "x", std::to_string(raw(since))));  // XXX
+    return journal_->eventsSince(since);
 }
 
 }  // namespace marrowdale::native

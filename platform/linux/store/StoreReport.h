@@ -66,9 +66,17 @@ struct StoreReport {
     std::uint64_t entries = 0;
     std::uint64_t documents = 0;  // entries that have a document identifier
     std::uint64_t memory = 0;     // held by the index
-    std::uint64_t logBytes = 0;   // of all segments
+    std::uint64_t logBytes = 0;   // of the segments that the next start reads
     std::uint64_t snapshotBytes = 0;
     EventID lastEventID{};
+    // The history that is kept: its first event (one more than the last when there is none), the
+    // date at which it begins at the latest, and the size of all segments.
+    EventID oldestEventID{};
+    Date oldestEventDate;
+    std::uint64_t events = 0;
+    std::uint64_t historyBytes = 0;
+    // What was found wrong with older history, which is therefore gone; empty when nothing was.
+    std::string historyProblem;
     std::uint64_t documentIDsUsed = 0;  // given out or skipped, of 2^32 less the start
     std::uint64_t documentIDsLeft = 0;
     // The error that ended writing: no new identifiers are given out until the store is opened
