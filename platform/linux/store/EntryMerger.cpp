@@ -131,6 +131,16 @@ void EntryMerger::noteFolderDigest(RowNumber folder, std::uint32_t digest) {
     index_.markDirty(folder);
 }
 
+// Nothing is told of a file's other names when it gets one more.
+void EntryMerger::refreshOtherNames(RowNumber number, const EntryLook& look) {
+    for (const RowNumber other : index_.rowsOfFile(raw(look.status.fileID))) {
+        const Row& row = index_.row(other);
+        if (other != number && !row.has(Row::limbo) && isSameFile(row, look, false)) {
+            refresh(other, look);
+        }
+    }
+}
+
 RowNumber EntryMerger::addName(RowNumber folder, std::string_view name, const EntryLook& look,
                                const Kin& kin) {
     Row values = valuesOf(look);
@@ -140,6 +150,9 @@ RowNumber EntryMerger::addName(RowNumber folder, std::string_view name, const En
         return noRow;
     }
     changes_.appeared(added);
+    if (kin.row != noRow) {
+        refreshOtherNames(added, look);
+    }
     if (kin.document != 0) {
         index_.setDocument(added, kin.document);
     } else {

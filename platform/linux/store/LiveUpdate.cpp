@@ -171,6 +171,10 @@ void LiveUpdate::merge(const Found& found) {
         }
         return;
     }
+    if ((found.hint->what & WatchHint::movedTo) != 0 &&
+        found.hint->fromFolder == found.hint->folder) {
+        scope_.saves.renamedAway(found.hint->folder, found.hint->fromName);
+    }
     if (!found.isThere) {
         merger_.noteAbsent(folder, found.hint->name);
         return;

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <ctime>
 #include <system_error>
 #include <thread>
 #include <utility>
@@ -67,7 +68,8 @@ Expected<ReconcileReport> Reconciler::walkUntilSettled(Threads threads) {
     settled_ = false;
     for (int round = 0; round < mostRounds && !settled_; ++round) {
         walk(threads);
-        settled_ = !pushChangedFolders();
+        // What changes in a watched folder after it was listed is told.
+        settled_ = watches_.isWatching() || !pushChangedFolders();
     }
     const MutexLock lock(mutex_);
     if (failure_) {
@@ -397,6 +399,11 @@ bool Reconciler::pushChangedFolders() {
         }
         unsettled_ = false;
         stamps.swap(stamps_);
+    }
+    if (std::ranges::any_of(stamps, &Stamp::unsure)) {
+        // Listed within a tick of its last change: the same time may stand for another one.
+        constexpr timespec tick{.tv_sec = 0, .tv_nsec = clockTick + 1'000'000};
+        ::clock_nanosleep(CLOCK_MONOTONIC, 0, &tick, nullptr);
     }
     std::vector<RowNumber> again;
     std::vector<Stamp> kept;

@@ -27,6 +27,10 @@ void SafeSaves::arrived(FileID folder, std::string_view name, Arrival how,
     came = {how, std::string(fromName)};
 }
 
+void SafeSaves::renamedAway(FileID folder, std::string_view name) {
+    renamedAway_.emplace(folder, name);
+}
+
 RowNumber SafeSaves::folderRow(FileID folder) const {
     for (const RowNumber number : index_.rowsOfFile(raw(folder))) {
         if (index_.row(number).isFolder() && !index_.row(number).has(Row::limbo)) {
@@ -92,6 +96,7 @@ void SafeSaves::add(TreeChanges::Departure departure, Clock::time_point now,
     vacancy.file = departure.file;
     vacancy.isFolder = departure.isFolder;
     vacancy.since = now;
+    vacancy.wasRenamed = renamedAway_.contains({vacancy.folder, vacancy.name});
     const Row& row = index_.row(departure.row);
     if (!row.isFree() && row.fileID == raw(departure.file)) {
         vacancy.fingerprint = row.fingerprint;
@@ -133,6 +138,7 @@ std::vector<SafeSaves::Transfer> SafeSaves::settle(DeviceID device, Knowledge kn
     forgetOld(now);
     std::set<Number> news;
     takeDepartures(now, news);
+    renamedAway_.clear();
     takeArrivals(news);
     for (const Number number : news) {
         if (!decide(vacancies_.at(number), device, knowledge)) {

@@ -59,6 +59,9 @@ class SafeSaves {
     // but being made is no news of one that was renamed there.
     void arrived(FileID folder, std::string_view name, Arrival how, std::string_view fromName);
 
+    // A file was renamed away from that name, to another of the folder.
+    void renamedAway(FileID folder, std::string_view name);
+
     // Decides, once the index is as the disk is, but for rows in limbo, which are gone now.
     [[nodiscard]] std::vector<Transfer> settle(DeviceID device, Knowledge knowledge,
                                                Clock::time_point now);
@@ -110,6 +113,7 @@ class SafeSaves {
     Index& index_;
     TreeChanges& changes_;
     std::map<Name, Came> arrivals_;
+    std::set<Name> renamedAway_;
     std::map<Number, Vacancy> vacancies_;
     std::multimap<Name, Number> byName_;
     std::unordered_multimap<std::uint32_t, Number> byDocument_;

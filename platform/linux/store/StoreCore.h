@@ -115,6 +115,7 @@ class Store::Core {
     [[nodiscard]] Expected<void> runFull(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
     // False when everything must be looked at.
     [[nodiscard]] Expected<bool> runHints(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<bool> followHints(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<bool> drain(HintSet& hints) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<void> listUnwatched(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<void> checkRoot() MARROWDALE_EXCLUDES(mutex_);

@@ -54,9 +54,11 @@ inline FolderRequests makeRequests(const std::string& folder) {
 }
 
 // A fresh root, state and cache folder on one of the test file systems.
-class StoreTestBase : public testing::TestWithParam<TestFileSystem> {
+template <typename Parameter>
+class StoreTestBaseOf : public testing::TestWithParam<Parameter> {
   protected:
-    StoreTestBase() : directory_(GetParam().dir), root_(directory_.path() + "/root") {
+    explicit StoreTestBaseOf(const TestFileSystem& fileSystem)
+        : directory_(fileSystem.dir), root_(directory_.path() + "/root") {
         makeFolder(root_);
         state_ = directory_.path() + "/state";
         cache_ = directory_.path() + "/cache";
@@ -119,7 +121,13 @@ class StoreTestBase : public testing::TestWithParam<TestFileSystem> {
         });
     }
 
-    [[nodiscard]] StoreOptions options() const { return {state_, cache(), root_, {}, nullptr}; }
+    [[nodiscard]] virtual StoreOptions options() const {
+        StoreOptions options;
+        options.stateFolder = state_;
+        options.cacheFolder = cache();
+        options.rootPath = root_;
+        return options;
+    }
     [[nodiscard]] Expected<std::unique_ptr<Store>> tryOpen() { return Store::open(options()); }
     void open() {
         auto opened = tryOpen();
@@ -166,6 +174,11 @@ class StoreTestBase : public testing::TestWithParam<TestFileSystem> {
     std::string state_;
     std::string cache_;
     std::unique_ptr<Store> store_;
+};
+
+class StoreTestBase : public StoreTestBaseOf<TestFileSystem> {
+  protected:
+    StoreTestBase() : StoreTestBaseOf(GetParam()) {}
 };
 
 }  // namespace marrowdale::native

@@ -177,12 +177,20 @@ Expected<bool> Store::Core::drain(HintSet& hints) {
     return !drained->overflowed;
 }
 
-// Goes on while something is in limbo: a rename is queued before the look that missed the file, so
-// one more reading of the queue tells where it went. When that brings nothing, it is gone.
 Expected<bool> Store::Core::runHints(const TreeScope& scope) {
     if (auto listed = listUnwatched(scope); !listed) {
         return Unexpected(listed.error());
     }
+    const auto whole = followHints(scope);
+    if (whole && *whole) {
+        settle(SafeSaves::Knowledge::live);
+    }
+    return whole;
+}
+
+// Goes on while something is in limbo: a rename is queued before the look that missed the file, so
+// one more reading of the queue tells where it went. When that brings nothing, it is gone.
+Expected<bool> Store::Core::followHints(const TreeScope& scope) {
     HintSet hints;
     LiveUpdate update(scope);
     std::vector<HintSet::Hint> unreached;
@@ -213,11 +221,7 @@ Expected<bool> Store::Core::runHints(const TreeScope& scope) {
             break;
         }
     }
-    if (!unreached.empty() && !watches_->isComplete()) {
-        return false;
-    }
-    settle(SafeSaves::Knowledge::live);
-    return true;
+    return unreached.empty() || watches_->isComplete();
 }
 
 Expected<void> Store::Core::listUnwatched(const TreeScope& scope) {
@@ -257,7 +261,13 @@ Expected<void> Store::Core::runFull(const TreeScope& scope) {
         isFresh_ = isFresh;
         return Unexpected(report.error());
     }
-    if (reconciler.isSettled()) {
+    // What happened under the walk was told; where too much happened, the next pass walks again.
+    const auto whole = watcher_ ? followHints(scope) : Expected<bool>(true);
+    if (!whole) {
+        return Unexpected(whole.error());
+    }
+    mustLookAtAll_ = !*whole;
+    if (*whole && reconciler.isSettled()) {
         settle(SafeSaves::Knowledge::result);
     }
     makeSure();
