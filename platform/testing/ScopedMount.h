@@ -17,6 +17,11 @@ class ScopedMount {
     [[nodiscard]] static ScopedMount bind(const std::string& source, const std::string& target) {
         return {::mount(source.c_str(), target.c_str(), nullptr, MS_BIND, nullptr), target};
     }
+    // Merged folders; `options` names them, as mount(8) has it.
+    [[nodiscard]] static ScopedMount overlay(const std::string& target,
+                                             const std::string& options) {
+        return {::mount("none", target.c_str(), "overlay", 0, options.c_str()), target};
+    }
 
     ScopedMount(ScopedMount&& other) noexcept : target_(std::exchange(other.target_, {})) {}
     ScopedMount& operator=(ScopedMount&&) = delete;
