@@ -4,23 +4,23 @@
 
 #include <gtest/gtest.h>
 
-#include "platform/linux/events/FanotifyBytes.h"
 #include "platform/linux/events/FanotifyRecords.h"
+#include "platform/linux/events/FanotifyTestBytes.h"
 
 namespace marrowdale::native {
 namespace {
 
-const std::string folder = FanotifyBytes::handle(1, "folder__");
-const std::string other = FanotifyBytes::handle(0x81, "other_folder");
-const std::string thing = FanotifyBytes::handle(1, "thing___");
+const std::string folder = FanotifyTestBytes::handle(1, "folder__");
+const std::string other = FanotifyTestBytes::handle(0x81, "other_folder");
+const std::string thing = FanotifyTestBytes::handle(1, "thing___");
 
 std::string infoOf(std::uint8_t kind, std::string_view handle, std::string_view name = {},
                    std::size_t padding = 0) {
-    return FanotifyBytes::info(kind, handle, name, padding);
+    return FanotifyTestBytes::info(kind, handle, name, padding);
 }
 
 // The only record of the bytes.
-FanotifyRecord only(const FanotifyBytes& bytes) {
+FanotifyRecord only(const FanotifyTestBytes& bytes) {
     FanotifyRecords records(bytes.bytes());
     const auto record = records.next();
     EXPECT_TRUE(record);
@@ -30,7 +30,7 @@ FanotifyRecord only(const FanotifyBytes& bytes) {
 }
 
 TEST(FanotifyRecordsTest, nameInAFolderAndTheThing) {
-    FanotifyBytes bytes;
+    FanotifyTestBytes bytes;
     bytes.event(FAN_CREATE, infoOf(FAN_EVENT_INFO_TYPE_DFID_NAME, folder, "name", 3) +
                                 infoOf(FAN_EVENT_INFO_TYPE_FID, thing));
     const FanotifyRecord record = only(bytes);
@@ -46,7 +46,7 @@ TEST(FanotifyRecordsTest, folderItselfHasAnEmptyName) {
     for (const std::string& info : {infoOf(FAN_EVENT_INFO_TYPE_DFID_NAME, folder, "."),
                                     infoOf(FAN_EVENT_INFO_TYPE_DFID_NAME, folder, ""),
                                     infoOf(FAN_EVENT_INFO_TYPE_DFID, folder)}) {
-        FanotifyBytes bytes;
+        FanotifyTestBytes bytes;
         const FanotifyRecord record = only(bytes.event(FAN_ATTRIB | FAN_ONDIR, info));
         ASSERT_TRUE(record.place);
         EXPECT_EQ(record.place->folder, folder);
@@ -57,7 +57,7 @@ TEST(FanotifyRecordsTest, folderItselfHasAnEmptyName) {
 TEST(FanotifyRecordsTest, renameHasBothPlacesOrOneOfThem) {
     const std::string from = infoOf(FAN_EVENT_INFO_TYPE_OLD_DFID_NAME, folder, "old");
     const std::string to = infoOf(FAN_EVENT_INFO_TYPE_NEW_DFID_NAME, other, "new", 1);
-    FanotifyBytes both;
+    FanotifyTestBytes both;
     FanotifyRecord record =
         only(both.event(FAN_RENAME, from + to + infoOf(FAN_EVENT_INFO_TYPE_FID, thing)));
     ASSERT_TRUE(record.from && record.to);
@@ -66,16 +66,16 @@ TEST(FanotifyRecordsTest, renameHasBothPlacesOrOneOfThem) {
     EXPECT_EQ(record.to->folder, other);
     EXPECT_EQ(record.to->name, "new");
     EXPECT_EQ(record.thing, thing);
-    FanotifyBytes away;
+    FanotifyTestBytes away;
     record = only(away.event(FAN_RENAME, from));
     EXPECT_TRUE(record.from && !record.to);
-    FanotifyBytes here;
+    FanotifyTestBytes here;
     record = only(here.event(FAN_RENAME, to));
     EXPECT_TRUE(record.to && !record.from);
 }
 
 TEST(FanotifyRecordsTest, everyEventOfAReadIsTold) {
-    FanotifyBytes bytes;
+    FanotifyTestBytes bytes;
     for (std::size_t i = 0; i < 100; ++i) {
         bytes.event(FAN_MODIFY,
                     infoOf(FAN_EVENT_INFO_TYPE_DFID_NAME, folder, std::string(i + 1, 'n')));
@@ -94,10 +94,10 @@ TEST(FanotifyRecordsTest, everyEventOfAReadIsTold) {
 
 TEST(FanotifyRecordsTest, unknownInformationAndUnknownBitsArePassedOver) {
     constexpr std::uint64_t unknown = std::uint64_t{1} << 52U;
-    FanotifyBytes bytes;
+    FanotifyTestBytes bytes;
     bytes.event(FAN_MODIFY | unknown,
-                FanotifyBytes::unknownInfo(200, "what may come one day") +
-                    FanotifyBytes::unknownInfo(FAN_EVENT_INFO_TYPE_PIDFD, "1234") +
+                FanotifyTestBytes::unknownInfo(200, "what may come one day") +
+                    FanotifyTestBytes::unknownInfo(FAN_EVENT_INFO_TYPE_PIDFD, "1234") +
                     infoOf(FAN_EVENT_INFO_TYPE_DFID_NAME, folder, "name"));
     const FanotifyRecord record = only(bytes);
     EXPECT_EQ(record.mask, FAN_MODIFY | unknown);
@@ -107,7 +107,7 @@ TEST(FanotifyRecordsTest, unknownInformationAndUnknownBitsArePassedOver) {
 
 TEST(FanotifyRecordsTest, longerMetadataOfALaterKernelIsPassedOver) {
     const std::string info = infoOf(FAN_EVENT_INFO_TYPE_DFID_NAME, folder, "name");
-    FanotifyBytes bytes;
+    FanotifyTestBytes bytes;
     bytes.event(FAN_MODIFY, std::string(8, '\xff') + info);
     const std::uint16_t longer = sizeof(fanotify_event_metadata) + 8;
     std::memcpy(bytes.text().data() + offsetof(fanotify_event_metadata, metadata_len), &longer,
@@ -139,8 +139,8 @@ std::size_t readAll(std::string_view text, bool& malformed) {
     return count;
 }
 
-FanotifyBytes threeEvents() {
-    FanotifyBytes bytes;
+FanotifyTestBytes threeEvents() {
+    FanotifyTestBytes bytes;
     bytes
         .event(FAN_CREATE, infoOf(FAN_EVENT_INFO_TYPE_DFID_NAME, folder, "name", 3) +
                                infoOf(FAN_EVENT_INFO_TYPE_FID, thing))
@@ -152,7 +152,7 @@ FanotifyBytes threeEvents() {
 }
 
 TEST(FanotifyRecordsTest, cutAtAnyLengthIsMalformedButBetweenEvents) {
-    FanotifyBytes bytes = threeEvents();
+    FanotifyTestBytes bytes = threeEvents();
     std::vector<std::size_t> ends{0};
     for (std::uint32_t length = 0; ends.back() < bytes.text().size();) {
         std::memcpy(&length, bytes.text().data() + ends.back(), sizeof length);
@@ -168,10 +168,10 @@ TEST(FanotifyRecordsTest, cutAtAnyLengthIsMalformedButBetweenEvents) {
 }
 
 TEST(FanotifyRecordsTest, anyByteMayBeAnyOtherWithoutALookBeyondTheBytes) {
-    const FanotifyBytes good = threeEvents();
+    const FanotifyTestBytes good = threeEvents();
     for (std::size_t at = 0; at < good.bytes().size(); ++at) {
         for (int value = 0; value < 256; ++value) {
-            FanotifyBytes bad = good;
+            FanotifyTestBytes bad = good;
             bad.text()[at] = static_cast<char>(value);
             bool malformed = false;
             EXPECT_LE(readAll(bad.text(), malformed), 10U);
@@ -181,7 +181,7 @@ TEST(FanotifyRecordsTest, anyByteMayBeAnyOtherWithoutALookBeyondTheBytes) {
 
 TEST(FanotifyRecordsTest, lengthsThatMakeNoSenseEndTheReading) {
     const auto with = [](std::size_t at, std::uint32_t value, std::size_t bytes) {
-        FanotifyBytes bad = threeEvents();
+        FanotifyTestBytes bad = threeEvents();
         std::memcpy(bad.text().data() + at, &value, bytes);
         bool malformed = false;
         EXPECT_EQ(readAll(bad.text(), malformed), 0U) << at << " " << value;

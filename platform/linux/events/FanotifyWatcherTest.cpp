@@ -2,7 +2,7 @@
 #include <deque>
 #include <filesystem>
 
-#include "platform/linux/events/FanotifyBytes.h"
+#include "platform/linux/events/FanotifyTestBytes.h"
 #include "platform/linux/events/FanotifyWatcher.h"
 #include "platform/linux/events/WatcherTestWorld.h"
 #include "platform/linux/files/FileHandle.h"
@@ -104,15 +104,16 @@ TEST_P(FanotifyWatcherTest, eventsOfUnknownHandlesAreDropped) {
     ASSERT_TRUE(watcher->watchFolder(known.get(), FileID{1}));
     std::string otherGeneration = handleOf(known);
     otherGeneration.back() = static_cast<char>(otherGeneration.back() + 1);
-    FanotifyBytes bytes;
+    FanotifyTestBytes bytes;
     bytes
         .event(FAN_CREATE,
-               FanotifyBytes::info(FAN_EVENT_INFO_TYPE_DFID_NAME, otherGeneration, "unknown"))
+               FanotifyTestBytes::info(FAN_EVENT_INFO_TYPE_DFID_NAME, otherGeneration, "unknown"))
         .event(FAN_CREATE,
-               FanotifyBytes::info(FAN_EVENT_INFO_TYPE_DFID_NAME, handleOf(known), "known"))
-        .event(FAN_RENAME,
-               FanotifyBytes::info(FAN_EVENT_INFO_TYPE_OLD_DFID_NAME, otherGeneration, "from") +
-                   FanotifyBytes::info(FAN_EVENT_INFO_TYPE_NEW_DFID_NAME, handleOf(known), "to"));
+               FanotifyTestBytes::info(FAN_EVENT_INFO_TYPE_DFID_NAME, handleOf(known), "known"))
+        .event(
+            FAN_RENAME,
+            FanotifyTestBytes::info(FAN_EVENT_INFO_TYPE_OLD_DFID_NAME, otherGeneration, "from") +
+                FanotifyTestBytes::info(FAN_EVENT_INFO_TYPE_NEW_DFID_NAME, handleOf(known), "to"));
     calls_->reads = {bytes.text()};
     const Told told = drainAll(*watcher);
     EXPECT_EQ(told.events, 3U);
@@ -128,9 +129,9 @@ TEST_P(FanotifyWatcherTest, bytesThatAreNoEventsAreAnOverflow) {
     const auto watcher = scripted();
     const UniqueFD known = made("known");
     ASSERT_TRUE(watcher->watchFolder(known.get(), FileID{1}));
-    FanotifyBytes bytes;
+    FanotifyTestBytes bytes;
     bytes.event(FAN_CREATE,
-                FanotifyBytes::info(FAN_EVENT_INFO_TYPE_DFID_NAME, handleOf(known), "a"));
+                FanotifyTestBytes::info(FAN_EVENT_INFO_TYPE_DFID_NAME, handleOf(known), "a"));
     calls_->reads = {bytes.text() + "noise", bytes.text()};
     const Told told = drainAll(*watcher);
     EXPECT_TRUE(told.overflowed);

@@ -97,24 +97,24 @@ TEST_P(WatcherChoiceTest, fileIsRefusedByBoth) {
 
 // Its handles only name, and file-system marks are refused there.
 TEST_P(WatcherChoiceTest, mergedFoldersAreWatchedOneWayOrTheOther) {
-    const TemporaryDirectory lower("/dev/shm");
+    const TemporaryDirectory layers("/dev/shm");
     for (const char* name : {"upper", "work", "merged"}) {
-        makeFolder(lower.path(name));
+        makeFolder(layers.path(name));
     }
     writeFile(folder_.path("a"), "x");
-    const std::string options = "lowerdir=" + folder_.path() + ",upperdir=" + lower.path("upper") +
-                                ",workdir=" + lower.path("work");
-    const ScopedMount merged = ScopedMount::overlay(lower.path("merged"), options);
+    const std::string options = "lowerdir=" + folder_.path() + ",upperdir=" + layers.path("upper") +
+                                ",workdir=" + layers.path("work");
+    const ScopedMount merged = ScopedMount::overlay(layers.path("merged"), options);
     if (!merged) {
         MARROWDALE_SKIP_FOR_USER("only root may mount");
     }
-    const UniqueFD open(::open(lower.path("merged").c_str(), O_PATH | O_CLOEXEC));
+    const UniqueFD open(::open(layers.path("merged").c_str(), O_PATH | O_CLOEXEC));
     const auto made = makeWatcher(open.get());
     ASSERT_TRUE(made) << made.error().description();
     RecordProperty("reason", (*made)->status().reason);
     ASSERT_TRUE((*made)->watchRoot(open.get(), FileID{1}));
-    writeFile(lower.path("merged/b"), "x");
-    std::filesystem::rename(lower.path("merged/a"), lower.path("merged/c"));
+    writeFile(layers.path("merged/b"), "x");
+    std::filesystem::rename(layers.path("merged/a"), layers.path("merged/c"));
     const Told told = drainAll(**made);
     EXPECT_TRUE(told.has(FileID{1}, "b", WatchHint::appeared));
     EXPECT_TRUE(told.has(FileID{1}, "a", WatchHint::movedFrom));

@@ -5,7 +5,7 @@
 #include <poll.h>
 #include <thread>
 
-#include "platform/linux/events/OtherProcess.h"
+#include "platform/linux/events/WatcherTestProcess.h"
 #include "platform/linux/events/WatcherTestWorld.h"
 
 namespace marrowdale::native {
@@ -164,7 +164,7 @@ TEST_P(WatcherContractTest, whatAnotherProcessDidBeforeTheDrainIsToldByIt) {
         open.at(i) = world_.open("w/" + std::to_string(i), O_WRONLY | O_APPEND);
     }
     (void)world_.drain();
-    OtherProcess writer(
+    WatcherTestProcess writer(
         [&](std::uint8_t which) { return ::write(open.at(which).get(), "y", 1) == 1; });
     for (std::size_t round = 0; round < 2000; ++round) {
         const auto which = static_cast<std::uint8_t>(round % files);

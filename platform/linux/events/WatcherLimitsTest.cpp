@@ -2,7 +2,7 @@
 #include <fstream>
 #include <sched.h>
 
-#include "platform/linux/events/OtherProcess.h"
+#include "platform/linux/events/WatcherTestProcess.h"
 #include "platform/linux/events/WatcherTestWorld.h"
 
 namespace marrowdale::native {
@@ -44,7 +44,7 @@ bool runsOutOfMarksAndGoesOn(const std::string& folder, Watcher::Kind kind) {
 
 TEST_P(WatcherLimitsTest, noMoreMarksIsNoSpace) {
     const TemporaryDirectory folder;
-    const OtherProcess child([&](std::uint8_t request) {
+    const WatcherTestProcess child([&](std::uint8_t request) {
         if (request == 0) {
             return ::unshare(CLONE_NEWUSER) == 0 &&
                    lowerLimit(GetParam() == Watcher::Kind::fanotify ? "max_fanotify_marks"

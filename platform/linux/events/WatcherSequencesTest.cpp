@@ -1,8 +1,8 @@
 #include <algorithm>
 #include <filesystem>
 
-#include "platform/linux/events/EventSequence.h"
-#include "platform/linux/events/FileOperations.h"
+#include "platform/linux/events/WatcherTestOperations.h"
+#include "platform/linux/events/WatcherTestSequence.h"
 #include "platform/linux/events/WatcherTestWorld.h"
 
 namespace marrowdale::native {
@@ -50,13 +50,14 @@ class WatcherSequencesTest : public testing::TestWithParam<Param> {
         hints_.insert(hints_.end(), told.hints.begin(), told.hints.end());
     }
 
-    [[nodiscard]] bool concerns(const KeptHint& hint, const EventSequence::Expectation& one) const {
+    [[nodiscard]] bool concerns(const KeptHint& hint,
+                                const WatcherTestSequence::Expectation& one) const {
         const FileID number = numbers_.at(one.folder);
         return one.isFile ? hint.file == number
                           : raw(hint.file) == 0 && hint.folder == number && hint.name == one.name;
     }
 
-    void expectTold(const EventSequence::Expectation& one) const {
+    void expectTold(const WatcherTestSequence::Expectation& one) const {
         std::uint32_t what = 0;
         bool origin = !one.knowsOrigin;
         const FileID from = one.fromFolder.empty() ? FileID{} : numbers_.at(one.fromFolder);
@@ -71,7 +72,7 @@ class WatcherSequencesTest : public testing::TestWithParam<Param> {
         EXPECT_TRUE(origin) << one.folder << " " << one.name << testing::PrintToString(hints_);
     }
 
-    [[nodiscard]] bool isAllowed(const KeptHint& hint, const EventSequence& sequence) const {
+    [[nodiscard]] bool isAllowed(const KeptHint& hint, const WatcherTestSequence& sequence) const {
         const auto& all = sequence.expected;
         return std::any_of(all.begin(), all.end(),
                            [&](const auto& one) { return concerns(hint, one); }) ||
@@ -95,10 +96,10 @@ INSTANTIATE_TEST_SUITE_P(OnEach, WatcherSequencesTest,
                          paramName);
 
 TEST_P(WatcherSequencesTest, tellsWhatIsDone) {
-    const EventSequence sequence = EventSequence::read(
+    const WatcherTestSequence sequence = WatcherTestSequence::read(
         programFolder() + "/event-sequences/" + std::get<2>(GetParam()) + ".txt",
         kindName(std::get<1>(GetParam())));
-    FileOperations operations([&](const std::string& path) { return world_.at(path); });
+    WatcherTestOperations operations([&](const std::string& path) { return world_.at(path); });
     for (const auto& words : sequence.before) {
         operations.run(words);
     }

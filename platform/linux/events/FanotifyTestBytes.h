@@ -12,7 +12,7 @@
 namespace marrowdale::native {
 
 // Writes what the kernel would write, for tests.
-class FanotifyBytes {
+class FanotifyTestBytes {
   public:
     // A handle as records tell it: its type and its bytes.
     static std::string handle(std::int32_t type, std::string_view bytes) {
@@ -39,7 +39,7 @@ class FanotifyBytes {
         return asText(header) + std::string(body);
     }
 
-    FanotifyBytes& event(std::uint64_t mask, std::string_view infos) {
+    FanotifyTestBytes& event(std::uint64_t mask, std::string_view infos) {
         fanotify_event_metadata event{};
         event.event_len = static_cast<std::uint32_t>(sizeof event + infos.size());
         event.vers = FANOTIFY_METADATA_VERSION;

@@ -15,7 +15,7 @@ namespace marrowdale::native {
 
 // A case of what a watcher has to tell, as written in a file (sequences/README.md), for tests. What
 // can't be read throws std::runtime_error, naming the line.
-struct EventSequence {
+struct WatcherTestSequence {
     using Words = std::vector<std::string>;
 
     struct Expectation {
@@ -35,8 +35,8 @@ struct EventSequence {
     std::vector<std::pair<std::string, std::string>> allowed;  // folder, name
 
     // `kind`: "fanotify" or "inotify".
-    static EventSequence read(const std::string& path, const std::string& kind) {
-        EventSequence sequence;
+    static WatcherTestSequence read(const std::string& path, const std::string& kind) {
+        WatcherTestSequence sequence;
         std::ifstream file(path);
         std::string line;
         while (std::getline(file, line)) {

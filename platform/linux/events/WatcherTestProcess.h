@@ -14,10 +14,10 @@ namespace marrowdale::native {
 
 // A process that does what it is asked, one thing at a time, for tests. It is made by fork, so what
 // it does is limited to system calls and memory that was there before. Gone with the object.
-class OtherProcess {
+class WatcherTestProcess {
   public:
     // `work` gets the number of the request and answers whether it went well.
-    explicit OtherProcess(const std::function<bool(std::uint8_t)>& work) {
+    explicit WatcherTestProcess(const std::function<bool(std::uint8_t)>& work) {
         std::array<int, 2> ends{};
         if (::socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC, 0, ends.data()) != 0) {
             throw std::runtime_error("socketpair");
@@ -33,9 +33,9 @@ class OtherProcess {
             serve(theirs.get(), work);
         }
     }
-    OtherProcess(const OtherProcess&) = delete;
-    OtherProcess& operator=(const OtherProcess&) = delete;
-    ~OtherProcess() {
+    WatcherTestProcess(const WatcherTestProcess&) = delete;
+    WatcherTestProcess& operator=(const WatcherTestProcess&) = delete;
+    ~WatcherTestProcess() {
         socket_.reset();
         ::waitpid(process_, nullptr, 0);
     }

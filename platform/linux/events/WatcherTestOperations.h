@@ -20,10 +20,10 @@ namespace marrowdale::native {
 
 // The operations of event sequences (sequences/README.md), for tests. What the system refuses
 // throws std::system_error.
-class FileOperations {
+class WatcherTestOperations {
   public:
     // `at` makes a path of an argument.
-    explicit FileOperations(std::function<std::string(const std::string&)> at)
+    explicit WatcherTestOperations(std::function<std::string(const std::string&)> at)
         : at_(std::move(at)) {}
 
     // The operation and its arguments.
