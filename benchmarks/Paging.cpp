@@ -8,9 +8,9 @@
 #include "benchmarks/World.h"
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
-#include "providers/marrowdale/LocalItem.h"
-#include "providers/marrowdale/ParentFolderCache.h"
 #include "providers/marrowdale/fs/FSDirectoryEnumerator.h"
+#include "providers/marrowdale/items/LocalItem.h"
+#include "providers/marrowdale/items/ParentFolderCache.h"
 
 namespace marrowdale::benchmarks {
 namespace {

@@ -8,8 +8,8 @@
 
 #include "platform/foundation/FatalError.h"
 #include "platform/testing/FakePlatform.h"
-#include "providers/marrowdale/ItemForIdentifier.h"
-#include "providers/marrowdale/MRFileObjectIdentifier.h"
+#include "providers/marrowdale/items/ItemForIdentifier.h"
+#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 
 namespace {
 

@@ -20,6 +20,7 @@ INTERFACES = ["platform/foundation", "platform/hostframework", "platform/service
               "platform/Platform.h", "platform/SharedObjects.h"]
 FILES = ["platform/linux/files"]
 LINUX = ["platform/linux"]
+ITEMS = ["providers/marrowdale/items"]
 EXTENSION = ["providers/marrowdale"]
 EVERYTHING = ["platform", "providers", "host", "tests", "benchmarks", "fuzz"]
 
@@ -29,7 +30,8 @@ LAYERS = {
     "platform/hostframework": ["platform/foundation"],
     "platform/Platform.h": INTERFACES,
     "platform/SharedObjects.h": [],
-    "providers/marrowdale/fs": INTERFACES,
+    "providers/marrowdale/items": INTERFACES,
+    "providers/marrowdale/fs": INTERFACES + ITEMS,
     "providers/marrowdale": INTERFACES + EXTENSION,
     "platform/linux/files": ["platform/foundation", "platform/services"],
     "platform/linux/events": ["platform/foundation", "platform/services"] + FILES,
@@ -40,7 +42,7 @@ LAYERS = {
     "platform/linux/applications": ["platform/foundation", "platform/services"] + FILES,
     # The module is reached through its entry point, so the host knows the extension's interfaces
     # and never its classes. The codes of its errors are part of what it answers.
-    "host": INTERFACES + LINUX + ["providers/marrowdale/ProviderError.h"],
+    "host": INTERFACES + LINUX + ["providers/marrowdale/items/ProviderError.h"],
     # The interface between the two halves of platform/linux has a double that the tests of both use.
     "platform/testing": INTERFACES + ["platform/linux/files/DocumentIndex.h",
                                       "platform/linux/files/EntryStatus.h"],
@@ -165,20 +167,25 @@ SELF_TEST = [
     ("platform/services/FileSystem.h", '#include "platform/hostframework/FileProviderItem.h"', True),
     ("platform/services/FileSystem.h", '#include "platform/Platform.h"', True),
     ("platform/hostframework/A.h", '#include "platform/services/FileSystem.h"', True),
-    ("providers/marrowdale/LocalItem.cpp", '#include "platform/Platform.h"', False),
-    ("providers/marrowdale/LocalItem.cpp", '#include "platform/linux/files/UniqueFD.h"', True),
-    ("providers/marrowdale/LocalItem.cpp", "#include <sys/stat.h>", True),
-    ("providers/marrowdale/LocalItem.cpp", "#include <cerrno>", False),
-    ("providers/marrowdale/LocalItem.cpp", "  #  include <nlohmann/json.hpp>", True),
-    ("providers/marrowdale/LocalItem.cpp", '#include "providers/marrowdale/fs/FSChangeToken.h"', False),
-    ("providers/marrowdale/fs/A.cpp", '#include "providers/marrowdale/LocalItem.h"', True),
-    ("providers/marrowdale/LocalItemTest.cpp", '#include "platform/linux/files/UniqueFD.h"', False),
-    ("providers/marrowdale/LocalItemTest.cpp", '#include "host/daemon/World.h"', True),
-    ("providers/marrowdale/LocalItemTest.cpp", '#include "tests/support/TestWorld.h"', False),
-    ("providers/marrowdale/LocalItem.cpp", '#include "tests/support/TestWorld.h"', True),
+    ("providers/marrowdale/items/LocalItem.cpp", '#include "platform/Platform.h"', False),
+    ("providers/marrowdale/items/LocalItem.cpp", '#include "platform/linux/files/UniqueFD.h"', True),
+    ("providers/marrowdale/items/LocalItem.cpp", "#include <sys/stat.h>", True),
+    ("providers/marrowdale/items/LocalItem.cpp", "#include <cerrno>", False),
+    ("providers/marrowdale/items/LocalItem.cpp", "  #  include <nlohmann/json.hpp>", True),
+    ("providers/marrowdale/items/LocalItem.cpp", '#include "providers/marrowdale/fs/FSChangeToken.h"', True),
+    ("providers/marrowdale/items/LocalItem.cpp", '#include "providers/marrowdale/LocalFileEnumerator.h"', True),
+    ("providers/marrowdale/fs/A.cpp", '#include "providers/marrowdale/items/LocalItem.h"', False),
+    ("providers/marrowdale/fs/A.cpp", '#include "providers/marrowdale/LocalFileEnumerator.h"', True),
+    ("providers/marrowdale/fs/ATest.cpp", '#include "tests/support/TestWorld.h"', False),
+    ("providers/marrowdale/LocalFileEnumerator.cpp", '#include "providers/marrowdale/fs/FSChangeToken.h"', False),
+    ("providers/marrowdale/LocalFileEnumerator.cpp", '#include "providers/marrowdale/items/LocalItem.h"', False),
+    ("providers/marrowdale/items/LocalItemTest.cpp", '#include "platform/linux/files/UniqueFD.h"', False),
+    ("providers/marrowdale/items/LocalItemTest.cpp", '#include "host/daemon/World.h"', True),
+    ("providers/marrowdale/items/LocalItemTest.cpp", '#include "tests/support/TestWorld.h"', False),
+    ("providers/marrowdale/items/LocalItem.cpp", '#include "tests/support/TestWorld.h"', True),
     ("platform/linux/files/A.cpp", '#include "platform/linux/store/B.h"', True),
     ("platform/linux/files/A.cpp", '#include "platform/hostframework/FileProviderItem.h"', True),
-    ("platform/linux/files/A.cpp", '#include "providers/marrowdale/LocalItem.h"', True),
+    ("platform/linux/files/A.cpp", '#include "providers/marrowdale/items/LocalItem.h"', True),
     ("platform/linux/store/A.cpp", '#include "platform/linux/files/UniqueFD.h"', False),
     ("platform/linux/store/A.cpp", '#include "platform/testing/TestFiles.h"', True),
     ("platform/linux/store/ATest.cpp", '#include "platform/testing/TestFiles.h"', False),
@@ -187,7 +194,7 @@ SELF_TEST = [
     ("platform/testing/FakeIndex.h", '#include "platform/linux/store/Store.h"', True),
     ("platform/linux/store/A.cpp", "#include <sys/mman.h>", False),
     ("host/daemon/World.cpp", '#include "platform/linux/store/A.h"', False),
-    ("host/daemon/World.cpp", '#include "providers/marrowdale/LocalItem.h"', True),
+    ("host/daemon/World.cpp", '#include "providers/marrowdale/items/LocalItem.h"', True),
     ("host/daemon/World.cpp", '#include "platform/testing/TestFiles.h"', True),
     ("host/daemon/World.cpp", "#include <gtest/gtest.h>", True),
     ("host/daemon/World.cpp", "#include HEADER", True),

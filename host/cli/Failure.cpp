@@ -4,7 +4,7 @@
 #include "host/daemon/HarmlessText.h"
 #include "host/daemon/ItemRequests.h"
 #include "platform/hostframework/FileProviderConstants.h"
-#include "providers/marrowdale/ProviderError.h"
+#include "providers/marrowdale/items/ProviderError.h"
 
 namespace marrowdale::host {
 

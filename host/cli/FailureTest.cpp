@@ -5,7 +5,7 @@
 
 #include "host/cli/Failure.h"
 #include "platform/hostframework/FileProviderConstants.h"
-#include "providers/marrowdale/ProviderError.h"
+#include "providers/marrowdale/items/ProviderError.h"
 
 namespace marrowdale::host {
 namespace {

@@ -5,9 +5,9 @@
 
 #include "platform/foundation/FatalError.h"
 #include "platform/hostframework/FileProviderConstants.h"
-#include "providers/marrowdale/LocalItem.h"
-#include "providers/marrowdale/ParentFolderCache.h"
-#include "providers/marrowdale/ProviderError.h"
+#include "providers/marrowdale/items/LocalItem.h"
+#include "providers/marrowdale/items/ParentFolderCache.h"
+#include "providers/marrowdale/items/ProviderError.h"
 
 namespace marrowdale {
 

@@ -14,8 +14,8 @@
 #include "platform/testing/TestFiles.h"
 #include "platform/testing/TestSkip.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
-#include "providers/marrowdale/LocalItem.h"
-#include "providers/marrowdale/ProviderError.h"
+#include "providers/marrowdale/items/LocalItem.h"
+#include "providers/marrowdale/items/ProviderError.h"
 #include "tests/support/ItemComparison.h"
 #include "tests/support/TestWorld.h"
 

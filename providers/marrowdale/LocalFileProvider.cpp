@@ -4,12 +4,12 @@
 #include <vector>
 
 #include "platform/hostframework/FileProviderConstants.h"
-#include "providers/marrowdale/ItemForIdentifier.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
-#include "providers/marrowdale/LocalItem.h"
-#include "providers/marrowdale/MRFileObjectIdentifier.h"
-#include "providers/marrowdale/MRWFileObjectIdentifier.h"
-#include "providers/marrowdale/ProviderError.h"
+#include "providers/marrowdale/items/ItemForIdentifier.h"
+#include "providers/marrowdale/items/LocalItem.h"
+#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
+#include "providers/marrowdale/items/ProviderError.h"
 
 namespace marrowdale {
 

@@ -9,7 +9,7 @@
 #include "platform/testing/TestFiles.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
 #include "providers/marrowdale/LocalFileProvider.h"
-#include "providers/marrowdale/ProviderError.h"
+#include "providers/marrowdale/items/ProviderError.h"
 #include "tests/support/TestWorld.h"
 
 namespace marrowdale {

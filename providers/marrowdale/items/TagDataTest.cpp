@@ -3,7 +3,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/foundation/PropertyList.h"
-#include "providers/marrowdale/TagData.h"
+#include "providers/marrowdale/items/TagData.h"
 
 namespace marrowdale {
 namespace {

@@ -1,4 +1,4 @@
-#include "providers/marrowdale/TagData.h"
+#include "providers/marrowdale/items/TagData.h"
 
 #include <cerrno>
 #include <optional>

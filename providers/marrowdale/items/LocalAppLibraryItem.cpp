@@ -1,10 +1,10 @@
-#include "providers/marrowdale/LocalAppLibraryItem.h"
+#include "providers/marrowdale/items/LocalAppLibraryItem.h"
 
 #include <string>
 #include <variant>
 
 #include "platform/hostframework/FileProviderConstants.h"
-#include "providers/marrowdale/MRWFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
 
 namespace marrowdale {
 

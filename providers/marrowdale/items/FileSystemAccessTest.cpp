@@ -6,7 +6,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/testing/FakePlatform.h"
-#include "providers/marrowdale/FileSystemAccess.h"
+#include "providers/marrowdale/items/FileSystemAccess.h"
 
 namespace marrowdale {
 namespace {

@@ -1,4 +1,4 @@
-#include "providers/marrowdale/LocalItem.h"
+#include "providers/marrowdale/items/LocalItem.h"
 
 #include <charconv>
 #include <cstdio>
@@ -7,10 +7,10 @@
 
 #include "platform/foundation/FatalError.h"
 #include "platform/hostframework/FileProviderConstants.h"
-#include "providers/marrowdale/FileSystemAccess.h"
-#include "providers/marrowdale/ItemForIdentifier.h"
-#include "providers/marrowdale/MRFileObjectIdentifier.h"
-#include "providers/marrowdale/ParentFolderCache.h"
+#include "providers/marrowdale/items/FileSystemAccess.h"
+#include "providers/marrowdale/items/ItemForIdentifier.h"
+#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
+#include "providers/marrowdale/items/ParentFolderCache.h"
 
 namespace marrowdale {
 

@@ -5,8 +5,8 @@
 
 #include "platform/hostframework/FileProviderConstants.h"
 #include "platform/testing/FakePlatform.h"
-#include "providers/marrowdale/MRFileObjectIdentifier.h"
-#include "providers/marrowdale/MRWFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
 
 namespace marrowdale {
 namespace {

@@ -2,7 +2,7 @@
 
 #include <memory>
 
-#include "providers/marrowdale/LocalItem.h"
+#include "providers/marrowdale/items/LocalItem.h"
 
 namespace marrowdale {
 

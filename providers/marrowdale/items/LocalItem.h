@@ -8,7 +8,7 @@
 
 #include "platform/Platform.h"
 #include "platform/hostframework/FileProviderItem.h"
-#include "providers/marrowdale/ItemMetadata.h"
+#include "providers/marrowdale/items/ItemMetadata.h"
 
 namespace marrowdale {
 

@@ -1,4 +1,4 @@
-#include "providers/marrowdale/ItemMetadata.h"
+#include "providers/marrowdale/items/ItemMetadata.h"
 
 #include <memory>
 #include <string>
@@ -6,8 +6,8 @@
 #include <vector>
 
 #include "platform/foundation/Utf8.h"
-#include "providers/marrowdale/FileSystemAccess.h"
-#include "providers/marrowdale/TagData.h"
+#include "providers/marrowdale/items/FileSystemAccess.h"
+#include "providers/marrowdale/items/TagData.h"
 
 namespace marrowdale {
 

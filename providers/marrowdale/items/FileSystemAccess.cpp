@@ -1,4 +1,4 @@
-#include "providers/marrowdale/FileSystemAccess.h"
+#include "providers/marrowdale/items/FileSystemAccess.h"
 
 #include <array>
 #include <cerrno>

@@ -1,4 +1,4 @@
-#include "providers/marrowdale/MRFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 
 #include <algorithm>
 #include <atomic>
@@ -12,8 +12,8 @@
 #include <utility>
 
 #include "platform/hostframework/FileProviderConstants.h"
-#include "providers/marrowdale/FileSystemAccess.h"
-#include "providers/marrowdale/MRWFileObjectIdentifier.h"
+#include "providers/marrowdale/items/FileSystemAccess.h"
+#include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
 
 namespace marrowdale {
 

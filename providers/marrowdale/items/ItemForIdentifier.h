@@ -3,8 +3,8 @@
 #include <memory>
 #include <string_view>
 
-#include "providers/marrowdale/LocalAppLibraryItem.h"
-#include "providers/marrowdale/LocalItem.h"
+#include "providers/marrowdale/items/LocalAppLibraryItem.h"
+#include "providers/marrowdale/items/LocalItem.h"
 
 namespace marrowdale {
 

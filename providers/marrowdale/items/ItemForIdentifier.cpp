@@ -1,7 +1,7 @@
-#include "providers/marrowdale/ItemForIdentifier.h"
+#include "providers/marrowdale/items/ItemForIdentifier.h"
 
 #include "platform/hostframework/FileProviderConstants.h"
-#include "providers/marrowdale/MRFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 
 namespace marrowdale {
 

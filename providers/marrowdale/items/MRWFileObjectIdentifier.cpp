@@ -1,4 +1,4 @@
-#include "providers/marrowdale/MRWFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
 
 #include <algorithm>
 #include <array>

@@ -7,7 +7,7 @@
 #include "platform/testing/TestFileSystems.h"
 #include "platform/testing/TestFiles.h"
 #include "platform/testing/TestSkip.h"
-#include "providers/marrowdale/LocalAppLibraryItem.h"
+#include "providers/marrowdale/items/LocalAppLibraryItem.h"
 #include "tests/support/TestWorld.h"
 
 namespace marrowdale {

@@ -1,4 +1,4 @@
-#include "providers/marrowdale/ParentFolderCache.h"
+#include "providers/marrowdale/items/ParentFolderCache.h"
 
 #include <algorithm>
 #include <utility>
