@@ -1,0 +1,238 @@
+#include <array>
+#include <utility>
+
+#include "providers/marrowdale/fs/DocIDChangePath.h"
+#include "providers/marrowdale/fs/FSEventDescription.h"
+#include "providers/marrowdale/fs/FSEventReader.h"
+#include "providers/marrowdale/items/FileSystemAccess.h"
+#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
+
+namespace marrowdale {
+
+namespace {
+
+constexpr std::string_view documentPathMark = ".docid/";
+constexpr std::string_view documentPathFormat = "/.docid/$dev/changed/$docid/src=$src,dst=$dst";
+
+std::string quoted(std::string_view text) {
+    return "\"" + std::string(text) + "\"";
+}
+
+bool says(const FileEvent& event, std::uint32_t flags) {
+    return (event.flags & flags) != 0;
+}
+
+bool saysDropped(const FileEvent& event) {
+    return says(event, FileEventFlag::userDropped | FileEventFlag::kernelDropped);
+}
+
+// `url` is contained in `root`, or is it; both without "." and "..".
+bool isHiddenBelow(const URL& root, const URL& url) {
+    const std::string& outer = root.path();
+    const std::size_t begin = outer.size() == 1 ? 0 : outer.size();
+    return url.path().find("/.", begin) != std::string::npos;
+}
+
+// What stands at a place: the entry itself, where it is a link too.
+struct Entry {
+    bool exists = false;
+    std::optional<FileID> fileID;
+};
+
+// What the look brings is cached on the URL, so the item that is made of it costs no second one.
+Entry entryAt(const Platform& platform, const URL& url) {
+    const auto value = platform.fileSystem.resourceValue(url, ResourceKey::fileID);
+    if (!value) {
+        const Error& error = value.error();
+        const bool isMissing = error.domain == ErrorDomain::file &&
+                               error.code == static_cast<int>(FileErrorCode::noSuchFile);
+        return {.exists = !isMissing, .fileID = {}};
+    }
+    const auto* number = std::get_if<Number>(&*value);
+    const auto fileID = number ? unsignedValue(*number) : std::nullopt;
+    return {.exists = true, .fileID = fileID ? std::optional(FileID{*fileID}) : std::nullopt};
+}
+
+std::shared_ptr<LocalItem> makeItem(const Platform& platform, const URL& url) {
+    return LocalItem::initWithURL(platform, url,
+                                  {.customItemID = {},
+                                   .customParentItemID = {},
+                                   .customFilename = {},
+                                   .hasLumenoDomainIdentifier = true,
+                                   .bundleIdentifier = {}});
+}
+
+}  // namespace
+
+void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> events) {
+    logDecision([&] { return "fsevent: received " + std::to_string(events.size()) + " events"; });
+    for (const FileEvent& event : events) {
+        const auto delegate = delegate_.lock();
+        if (!delegate || run.isStopped) {
+            return;
+        }
+        std::optional<LogSection> section;
+        if (verbose_) {
+            section.emplace(platform_.log, [&] { return " fsevents: " + marrowdale::description(event); });
+        }
+        if (!handle(run, *delegate, event)) {
+            return;
+        }
+        if (!says(event, FileEventFlag::eventIDsWrapped)) {
+            countAsProcessed(event.id);
+        }
+    }
+}
+
+// Runs of the reader follow each other on one queue, so no two of these meet.
+void FSEventReader::countAsProcessed(EventID eventID) {
+    if (eventID > lastProcessedFSEventID_.load()) {
+        lastProcessedFSEventID_ = eventID;
+    }
+}
+
+bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate,
+                           const FileEvent& event) const {
+    if (says(event, FileEventFlag::eventIDsWrapped)) {
+        if (verbose_) {
+            platform_.log.info([] { return "fsevents id wrapped"; });
+        }
+        delegate.fsEventReaderMustReset();
+        return true;
+    }
+    if (saysDropped(event)) {
+        platform_.log.debug([] { return "dropped fsevents"; });
+        delegate.fsEventReaderMustReset();
+    }
+    if (says(event, FileEventFlag::historyDone)) {
+        if (run.isStopped) {
+            return false;
+        }
+        logDecision([] { return "done processing history"; });
+        delegate.fsEventReaderDidFinishHistory(event.id);
+    }
+    const bool concernsTheStream = saysDropped(event) || says(event, FileEventFlag::historyDone);
+    if (concernsTheStream && !event.path) {
+        return true;
+    }
+    return !run.isStopped && handlePath(run, delegate, event);
+}
+
+bool FSEventReader::handlePath(const Run& run, FSEventReaderDelegate& delegate,
+                               const FileEvent& event) const {
+    if (!event.path || event.path->empty()) {
+        platform_.log.error("ignore event " + marrowdale::description(event) +
+                            " because no path can be extracted");
+        return true;
+    }
+    if (mode_ == FSEventReaderMode::docIDBased && event.path->contains(documentPathMark)) {
+        return handleDocumentPath(run, delegate, event);
+    }
+    // Made anew for each event, so that nothing that was cached for the path is taken for what is
+    // there now.
+    return handleURL(run, delegate, event, URL::fileURL(*event.path),
+                     Comparison::withTheEventsFile);
+}
+
+bool FSEventReader::handleDocumentPath(const Run& run, FSEventReaderDelegate& delegate,
+                                       const FileEvent& event) const {
+    DocIDChange change;
+    if (!parseDocIDChangePath(*event.path, change)) {
+        platform_.log.error("can't parse docID path " + quoted(*event.path) +
+                            "; format expected is " + quoted(documentPathFormat));
+        return true;
+    }
+    const auto url = fileURLWithItemIdentifier(
+        platform_,
+        MRWFileObjectIdentifier::fromDocumentID(static_cast<std::uint64_t>(change.documentID)));
+    if (!url) {
+        logDecision([&] { return "can't compute url for " + marrowdale::description(change); });
+        return true;
+    }
+    return handleURL(run, delegate, event, *url, Comparison::none);
+}
+
+bool FSEventReader::handleURL(const Run& run, FSEventReaderDelegate& delegate,
+                              const FileEvent& event, const URL& url, Comparison comparison) const {
+    switch (placeOf(url)) {
+        case Place::hidden:
+            logDecision([&] { return "dropping fsevent at " + url.path() + "; URL is hidden"; });
+            return true;
+        case Place::notMonitored:
+            logDecision(
+                [&] { return "dropping fsevent at " + url.path() + "; URL is not monitored"; });
+            return true;
+        case Place::visible:
+            break;
+    }
+    const Entry entry = entryAt(platform_, url);
+    if (!entry.exists) {
+        return tellDeletions(run, delegate, event, url);
+    }
+    const bool isOther = comparison == Comparison::withTheEventsFile && event.fileID &&
+                         entry.fileID && *entry.fileID != *event.fileID;
+    return handleItem(run, delegate, event, url, isOther ? entry.fileID : std::nullopt);
+}
+
+// `otherFile` is the file that stands at the URL, where it is not the event's own.
+bool FSEventReader::handleItem(const Run& run, FSEventReaderDelegate& delegate,
+                               const FileEvent& event, const URL& url,
+                               std::optional<FileID> otherFile) const {
+    const auto item = makeItem(platform_, url);
+    if (item && !otherFile) {
+        logDecision([&] { return "did change " + item->description(); });
+        delegate.fsEventReaderDidChangeItem(item, event);
+        return true;
+    }
+    logDecision([&] {
+        const std::string text = "dropping fsevent at " + url.path();
+        return item ? text + "; fileObjectIDs don't match (" + std::to_string(raw(*otherFile)) +
+                          " vs " + std::to_string(raw(*event.fileID)) + ")"
+                    : text + "; can't create local item";
+    });
+    // Its own file left this place all the same.
+    const bool isGone = otherFile && says(event, FileEventFlag::gone);
+    return !isGone || tellDeletions(run, delegate, event, url);
+}
+
+bool FSEventReader::tellDeletions(const Run& run, FSEventReaderDelegate& delegate,
+                                  const FileEvent& event, const URL& url) const {
+    std::vector<std::string> identifiers;
+    if (event.fileID) {
+        identifiers.push_back(MRWFileObjectIdentifier::fromFileID(raw(*event.fileID)));
+    }
+    if (event.goneDocument != DocumentID{}) {
+        identifiers.push_back(MRWFileObjectIdentifier::fromDocumentID(raw(event.goneDocument)));
+    }
+    if (identifiers.empty()) {
+        logDecision(
+            [&] { return "dropping fsevent at " + quoted(url.path()) + "; No object at path"; });
+    }
+    for (const std::string& identifier : identifiers) {
+        if (run.isStopped) {
+            return false;
+        }
+        logDecision([&] { return "did delete " + identifier; });
+        delegate.fsEventReaderDidDeleteItem(identifier, url.path(), event);
+    }
+    return true;
+}
+
+// Where monitored folders lie in each other, what is visible below one of them is visible.
+FSEventReader::Place FSEventReader::placeOf(const URL& url) const {
+    const URL place = url.standardized();
+    Place found = Place::notMonitored;
+    for (const URL& root : urls_) {
+        if (relationship(root, place) == URLRelationship::other) {
+            continue;
+        }
+        if (!isHiddenBelow(root.standardized(), place)) {
+            return Place::visible;
+        }
+        found = Place::hidden;
+    }
+    return found;
+}
+
+}  // namespace marrowdale
