@@ -5,6 +5,7 @@
 
 #include "platform/foundation/FatalError.h"
 #include "platform/hostframework/FileProviderConstants.h"
+#include "providers/marrowdale/fs/FSEventReader.h"
 #include "providers/marrowdale/items/LocalItem.h"
 #include "providers/marrowdale/items/ParentFolderCache.h"
 #include "providers/marrowdale/items/ProviderError.h"
@@ -117,7 +118,7 @@ void LocalFileEnumerator::gatherPhase(FileProviderEnumerationObserver& observer,
 
 Expected<LocalFileEnumerator::Start> LocalFileEnumerator::startOfPage(
     const std::optional<FSChangeToken>& token) const {
-    const auto deviceUUID = platform_.fileEvents.volumeUUID(urls_.front());
+    const auto deviceUUID = FSEventReader::volumeUUID(platform_, urls_.front());
     if (!deviceUUID) {
         const std::string& path = urls_.front().path();
         platform_.log.error("can't get volume UUID for " + path);
@@ -129,7 +130,10 @@ Expected<LocalFileEnumerator::Start> LocalFileEnumerator::startOfPage(
         if (!eventID) {
             return Unexpected(eventID.error());
         }
-        return Start{.deviceUUID = *deviceUUID, .streamEventID = *eventID, .offset = 0};
+        return Start{.deviceUUID = *deviceUUID,
+                     .streamEventID = *eventID,
+                     .offset = 0,
+                     .previousEventID = *eventID};
     }
     if (token->deviceUUID != *deviceUUID) {
         platform_.log.debug([&] {
@@ -138,11 +142,40 @@ Expected<LocalFileEnumerator::Start> LocalFileEnumerator::startOfPage(
         });
         return Unexpected(errorSyncAnchorExpired());
     }
+    return startOfNextPage(*token);
+}
+
+Expected<LocalFileEnumerator::Start> LocalFileEnumerator::startOfNextPage(
+    const FSChangeToken& token) const {
+    using Kind = FSEventReaderGatherPhaseResumeStatus::Kind;
     platform_.log.debug(
-        [&] { return "resume gather phase at offset " + std::to_string(token->offset); });
-    return Start{.deviceUUID = *deviceUUID,
-                 .streamEventID = EventID{token->streamEventID},
-                 .offset = token->offset};
+        [&] { return "resume gather phase at offset " + std::to_string(token.offset); });
+    const EventID previousEventID{token.streamEventID};
+    const auto resume = FSEventReader::canResumeGatherPhase(platform_, urls_, previousEventID);
+    if (!resume) {
+        return Unexpected(resume.error());
+    }
+    switch (resume->status.kind) {
+        case Kind::deletionOccurred:
+            platform_.log.debug([&] {
+                return "deletion of " + resume->status.path + " requires to re-gather from scratch";
+            });
+            return Unexpected(errorSyncAnchorExpired());
+        case Kind::cantReplayHistoricalFSEvents:
+            platform_.log.debug([] {
+                return "can't replay historical FSEvents, need to re-start gather phase from "
+                       "scratch";
+            });
+            return Unexpected(errorSyncAnchorExpired());
+        case Kind::canResume:
+            break;
+    }
+    platform_.log.debug(
+        [&] { return "safe to resume gather phase from " + std::to_string(raw(resume->eventID)); });
+    return Start{.deviceUUID = token.deviceUUID,
+                 .streamEventID = resume->eventID,
+                 .offset = token.offset,
+                 .previousEventID = previousEventID};
 }
 
 FSDirectoryEnumerator LocalFileEnumerator::listingRequest(const Start& start) const {
@@ -157,7 +190,7 @@ FSDirectoryEnumerator LocalFileEnumerator::listingRequest(const Start& start) co
             .keys = LocalItem::listingKeys(),
             .attributeNames = listedAttributeNames(),
             .startPosition =
-                start.offset == 0 ? std::nullopt : cursors().find(cursorKey(start, start.offset))};
+                start.offset == 0 ? std::nullopt : cursors().find(keyOfPreviousPage(start))};
 }
 
 std::vector<URL> LocalFileEnumerator::roots() const {
@@ -179,13 +212,18 @@ FSWalkCursors& LocalFileEnumerator::cursors() const {
     return platform_.shared.get<FSWalkCursors>("marrowdale.walk-cursors");
 }
 
-FSWalkCursorKey LocalFileEnumerator::cursorKey(const Start& start, std::uint64_t offset) const {
+FSWalkCursorKey LocalFileEnumerator::keyOfPreviousPage(const Start& start) const {
+    return cursorKey(start.deviceUUID, start.previousEventID, start.offset);
+}
+
+FSWalkCursorKey LocalFileEnumerator::cursorKey(const UUID& deviceUUID, EventID eventID,
+                                               std::uint64_t offset) const {
     std::vector<std::string> paths;
     for (const URL& url : roots()) {
         paths.push_back(url.path());
     }
-    return {.deviceUUID = start.deviceUUID,
-            .streamEventID = raw(start.streamEventID),
+    return {.deviceUUID = deviceUUID,
+            .streamEventID = raw(eventID),
             .offset = offset,
             .container = container_,
             .roots = std::move(paths)};
@@ -198,7 +236,7 @@ std::unique_ptr<DirectoryEnumerator> LocalFileEnumerator::takeRestingWalk(const 
         const std::lock_guard lock(mutex_);
         std::swap(resting, resting_);
     }
-    const bool fits = resting.walk && resting.key == cursorKey(start, start.offset);
+    const bool fits = resting.walk && resting.key == keyOfPreviousPage(start);
     return fits ? std::move(resting.walk) : nullptr;
 }
 
@@ -222,7 +260,7 @@ void LocalFileEnumerator::finish(FileProviderEnumerationObserver& observer, cons
         return;
     }
     if (result.nextPosition) {
-        FSWalkCursorKey key = cursorKey(start, result.position);
+        FSWalkCursorKey key = cursorKey(start.deviceUUID, start.streamEventID, result.position);
         cursors().remember(key, std::move(*result.nextPosition));
         letRest({std::move(key), std::move(result.restingWalk)});
     }

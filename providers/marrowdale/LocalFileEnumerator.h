@@ -17,10 +17,13 @@ namespace marrowdale {
 // Lists one container in pages of 200 items: an ordinary folder, or, under its own identifier, one
 // of the containers that gather several trees.
 //
-// A page is an encoded FSChangeToken: how far the listing got, and the event before which it began,
-// from which every later change can be replayed. The walk of the last page is kept open for the
-// next one until the listing is complete or `invalidate`; a page goes on without it too. A page
-// that was made for another history is refused with the sync-anchor-expired error.
+// A page is an encoded FSChangeToken: how far the listing got, and the newest event before it was
+// walked, from which every later change can be replayed. A page goes on only where nothing was
+// deleted since that event, because a deletion moves the offset of every entry behind it; so the
+// events since then are replayed first, on the caller's thread, and a page is refused with the
+// sync-anchor-expired error where something is gone, where the events are no longer all there, and
+// where it was made for another history. The walk of the last page is kept open for the next one
+// until the listing is complete or `invalidate`; a page goes on without it too.
 //
 // Any thread, several at once.
 class LocalFileEnumerator : public FileProviderEnumerator {
@@ -46,11 +49,13 @@ class LocalFileEnumerator : public FileProviderEnumerator {
     [[nodiscard]] const URL& enumeratedItemURL() const { return urls_.front(); }
 
   private:
-    // From where a page is walked: the history and event it belongs to, and its offset.
+    // From where a page is walked: the history and event it belongs to, and its offset; and the
+    // event of the page before it, under which the walk was left.
     struct Start {
         UUID deviceUUID;
         EventID streamEventID{};
         std::uint64_t offset = 0;
+        EventID previousEventID{};
     };
     // The walk that ended with a page, for the next one.
     struct RestingWalk {
@@ -60,10 +65,13 @@ class LocalFileEnumerator : public FileProviderEnumerator {
     void gatherPhase(FileProviderEnumerationObserver& observer,
                      const std::optional<FSChangeToken>& token);
     [[nodiscard]] Expected<Start> startOfPage(const std::optional<FSChangeToken>& token) const;
+    [[nodiscard]] Expected<Start> startOfNextPage(const FSChangeToken& token) const;
     [[nodiscard]] FSDirectoryEnumerator listingRequest(const Start& start) const;
     [[nodiscard]] std::vector<URL> roots() const;
     [[nodiscard]] FSWalkCursors& cursors() const;
-    [[nodiscard]] FSWalkCursorKey cursorKey(const Start& start, std::uint64_t offset) const;
+    [[nodiscard]] FSWalkCursorKey keyOfPreviousPage(const Start& start) const;
+    [[nodiscard]] FSWalkCursorKey cursorKey(const UUID& deviceUUID, EventID eventID,
+                                            std::uint64_t offset) const;
     void finish(FileProviderEnumerationObserver& observer, const Start& start,
                 FSDirectoryEnumerator::Result result);
     [[nodiscard]] std::unique_ptr<DirectoryEnumerator> takeRestingWalk(const Start& start);
