@@ -101,7 +101,7 @@ FileEventStreamRequest FSEventReader::request(const std::shared_ptr<Run>& run) {
     // the batch lets go of this function and of what it captured.
     request.callback = [weak = weak_from_this(), run](std::span<const FileEvent> events) {
         const auto reader = weak.lock();
-        const auto own = run;
+        const auto own = run;  // NOLINT(performance-unnecessary-copy-initialization)
         if (reader) {
             reader->handleBatch(*own, events);
         }
