@@ -1,5 +1,6 @@
 #include <thread>
 
+#include "platform/foundation/Semaphore.h"
 #include "providers/marrowdale/fs/FSEventReaderTestWorld.h"
 
 namespace marrowdale {
@@ -229,11 +230,14 @@ TEST_P(FSEventReaderTest, aBatchOnTheQueueIsNotToldAfterAStopFromElsewhere) {
 TEST_P(FSEventReaderTest, theReaderMayBeReleasedFromWithinACall) {
     startReader();
     std::weak_ptr<FSEventReader> weak = reader_;
+    Semaphore released;
     delegate_->within = [&](const std::string&) {
         reader_->stop();
         reader_.reset();
+        released.signal();
     };
     stream()->hand({gone("a", FileID{1}), gone("b", FileID{2})});
+    released.wait();
     EXPECT_TRUE(waitUntil([&] { return weak.expired(); }));
     EXPECT_EQ(delegate_->told.size(), 1U);
 }
