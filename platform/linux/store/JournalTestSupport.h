@@ -98,6 +98,17 @@ class TestJournal {
         }
     }
 
+    void snapshot() {
+        if (index_->endOfRows() <= rootRow) {
+            Row values{};
+            values.flags = static_cast<std::uint32_t>(RowKind::folder);
+            ASSERT_EQ(index_->add(noRow, {}, values), rootRow);
+        }
+        commit();
+        const auto done = journal_->writeSnapshot(*index_);
+        ASSERT_TRUE(done) << done.error().description();
+    }
+
     // All events behind `since`; what went wrong is a failure of the test.
     [[nodiscard]] std::vector<TestEvent> eventsSince(std::uint64_t since) const {
         auto cursor = journal_->eventsSince(EventID{since});
