@@ -76,7 +76,7 @@ class ByteReader {
         std::uint64_t value = 0;
         for (unsigned shift = 0; shift <= lastShift; shift += 7) {
             const auto byte = take<std::uint8_t>();
-            if (shift == lastShift && byte > 1) {
+            if (!ok_ || (shift == lastShift && byte > 1)) {
                 break;
             }
             value |= std::uint64_t{byte & 0x7FU} << shift;
