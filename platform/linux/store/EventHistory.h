@@ -15,8 +15,8 @@
 namespace marrowdale::native {
 
 // Goes through the history in order. Reads what is committed from the segments on disk, checks
-// every byte, and holds the segment it reads open, so that retention does not take it away. One
-// thread at a time; it may outlive commits, not the store.
+// every byte it hands out, and holds the segment it reads open, so that retention does not take it
+// away. One thread at a time; it may outlive commits, not the store.
 class EventCursor {
   public:
     virtual ~EventCursor() = default;
