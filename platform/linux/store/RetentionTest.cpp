@@ -1,6 +1,9 @@
 #include <algorithm>
 #include <cerrno>
+#include <fcntl.h>
 #include <filesystem>
+#include <sys/mount.h>
+#include <unistd.h>
 #include <vector>
 
 #include <gmock/gmock.h>
@@ -8,6 +11,8 @@
 
 #include "platform/linux/store/JournalTestSupport.h"
 #include "platform/linux/store/Retention.h"
+#include "platform/testing/ScopedMount.h"
+#include "platform/testing/TestSkip.h"
 
 namespace marrowdale::native {
 namespace {
@@ -208,6 +213,41 @@ TEST_F(JournalRetentionTest, HistoryBeginsBehindASegmentThatIsDamagedOrMissing) 
         EXPECT_EQ(world.journal().historyProblem().empty(), missing);
         EXPECT_FALSE(std::filesystem::exists(world.folder().segment(1)));
     }
+}
+
+TEST_F(JournalRetentionTest, AFullDiskGetsRoom) {
+    if (!runsAsRoot()) {
+        MARROWDALE_SKIP_FOR_USER("only root may mount a small file system");
+    }
+    const TemporaryDirectory directory;
+    const auto mount = ScopedMount::memory(directory.path());
+    if (!mount ||
+        ::mount(nullptr, directory.path().c_str(), nullptr, MS_REMOUNT, "size=48m") != 0) {
+        MARROWDALE_SKIP("no tmpfs can be mounted here");
+    }
+    TestJournal world(directory.path());
+    world.open();
+    world.fillSegments(3);
+    world.snapshot();
+    const int filler = ::open(directory.path("filler").c_str(), O_WRONLY | O_CREAT, 0600);
+    const std::string block(4096, 'f');
+    while (::write(filler, block.data(), block.size()) > 0) {
+    }
+    ::close(filler);
+    EventBatch batch;
+    batch.add({.flags = 1, .path = block});
+    const auto refused =
+        world.journal().commit(world.index(), batch, world.journal().lastDocument());
+    ASSERT_FALSE(refused);
+    EXPECT_EQ(refused.error().code, ENOSPC);
+    const auto last = world.journal().lastEvent();
+    world.close();
+    world.options.retention = {std::chrono::seconds(0), 1, 0};
+    world.open();
+    EXPECT_EQ(world.journal().log()->segments().size(), 1U);
+    EXPECT_EQ(world.journal().lastEvent(), last);
+    ASSERT_TRUE(world.journal().commit(world.index(), batch, world.journal().lastDocument()));
+    EXPECT_EQ(world.eventsSince(last).size(), 1U);
 }
 
 // Nobody looks at the frames of old segments at a start. Reading them finds out.
