@@ -147,7 +147,8 @@ class StoreFullDiskTest : public testing::Test {
             for (int i = 0; i < 1000; ++i) {
                 writeFile(state_ + "/filler" + std::to_string(i), block);
             }
-        } catch (const std::system_error&) {
+        } catch (const std::system_error& error) {
+            EXPECT_EQ(error.code().value(), ENOSPC) << error.what();
         }
     }
     void makeRoom() {

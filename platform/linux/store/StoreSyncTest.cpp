@@ -29,11 +29,11 @@ int syncOrFail(long call, int file) {
 
 }  // namespace
 
-extern "C" int fdatasync(int file) {
-    return syncOrFail(SYS_fdatasync, file);
+extern "C" int fdatasync(int fildes) {
+    return syncOrFail(SYS_fdatasync, fildes);
 }
-extern "C" int fsync(int file) {
-    return syncOrFail(SYS_fsync, file);
+extern "C" int fsync(int fd) {
+    return syncOrFail(SYS_fsync, fd);
 }
 
 namespace marrowdale::native {

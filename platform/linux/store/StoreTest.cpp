@@ -309,11 +309,14 @@ TEST_P(StoreTest, PathsLongerThanTheKernelTakesAreFound) {
     const std::string name(200, 'd');
     UniqueFD at(::open(root().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     for (int i = 0; i < 30; ++i) {
+        ASSERT_TRUE(at);
         ASSERT_EQ(::mkdirat(at.get(), name.c_str(), 0700), 0);
         at.reset(::openat(at.get(), name.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
         folder += name + "/";
     }
-    UniqueFD(::openat(at.get(), "file", O_WRONLY | O_CREAT | O_CLOEXEC, 0600));
+    ASSERT_TRUE(at);
+    const UniqueFD file(::openat(at.get(), "file", O_WRONLY | O_CREAT | O_CLOEXEC, 0600));
+    ASSERT_TRUE(file);
     const auto found = statEntry(at.get(), "file");
     ASSERT_TRUE(found);
     open();

@@ -44,7 +44,7 @@ inline FolderRequests makeRequests(const std::string& folder) {
         if (!entry || !*entry) {
             break;
         }
-        const auto status = statEntry(reader.descriptor(), (*entry)->name.data());
+        const auto status = statEntry(reader.descriptor(), (*entry)->cName());
         if (status) {
             made.names.push_back(std::make_unique<std::string>((*entry)->name));
             made.requests.push_back({folderID, *made.folderPath, *made.names.back(), *status, {}});
