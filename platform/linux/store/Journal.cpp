@@ -101,8 +101,8 @@ Expected<void> putDirtyRows(FrameStream& out, const Index& index) {
 
 }  // namespace
 
-Journal::Journal(const StoreFolder& folder, StoreIdentity identity, Options options)
-    : folder_(folder),
+Journal::Journal(StoreFolder folder, StoreIdentity identity, Options options)
+    : folder_(std::move(folder)),
       identity_(std::move(identity)),
       options_(std::move(options)),
       log_(std::make_shared<LogView>(folder_, identity_.uuid)) {}

@@ -91,7 +91,7 @@ class Journal {
   private:
     struct Replay;
 
-    Journal(const StoreFolder& folder, StoreIdentity identity, Options options);
+    Journal(StoreFolder folder, StoreIdentity identity, Options options);
 
     [[nodiscard]] Expected<void> openSmallFiles(const std::string& cacheFolder);
     void openWitness(const std::string& cacheFolder);

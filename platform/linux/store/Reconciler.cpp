@@ -107,12 +107,11 @@ void Reconciler::walk(Threads threads) {
             second = std::thread([this] { work(); });
         }
     } catch (const std::system_error&) {
-        // One thread does it too.
+        work();  // one thread does it too
+        return;
     }
     work();
-    if (second.joinable()) {
-        second.join();
-    }
+    second.join();
 }
 
 void Reconciler::work() {
@@ -241,7 +240,7 @@ Reconciler::Outcome Reconciler::fillBatch(Visit& visit, DirectoryReader& reader,
             atEnd = true;
             break;
         }
-        const auto status = statEntry(reader.descriptor(), (*entry)->name.data());
+        const auto status = statEntry(reader.descriptor(), (*entry)->cName());
         if (!status) {
             if (status.error().code == ENOENT) {
                 continue;

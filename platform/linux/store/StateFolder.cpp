@@ -17,10 +17,11 @@ bool exists(const std::string& path) {
 
 std::uint64_t sizeOfFilesIn(const std::string& folder) {
     std::uint64_t bytes = 0;
+    const std::string prefix = folder + "/";
     const auto names = namesIn(folder);
     for (const std::string& name : names ? *names : std::vector<std::string>()) {
         struct stat found{};
-        if (::lstat((folder + "/" + name).c_str(), &found) == 0 && S_ISREG(found.st_mode)) {
+        if (::lstat((prefix + name).c_str(), &found) == 0 && S_ISREG(found.st_mode)) {
             bytes += static_cast<std::uint64_t>(found.st_size);
         }
     }

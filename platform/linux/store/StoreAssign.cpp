@@ -181,7 +181,7 @@ Expected<std::vector<Store::Core::Looked>> Store::Core::lookAtEntries(
         if (folder) {
             lookAgain(folder.get(), request, looked);
         }
-        all.push_back(std::move(looked));
+        all.push_back(looked);
     }
     return all;
 }

@@ -70,7 +70,7 @@ class Store::Core {
     struct Place {
         RowNumber number = noRow;
         std::string path;  // below the root
-        Row row;
+        Row row{};
     };
     // What a look at the disk brought for one request.
     struct Looked {
