@@ -1,7 +1,6 @@
 #include <cerrno>
 #include <fcntl.h>
 #include <filesystem>
-#include <fstream>
 #include <set>
 #include <string>
 #include <sys/stat.h>
@@ -10,6 +9,7 @@
 
 #include "platform/linux/files/DirectoryReader.h"
 #include "platform/testing/TemporaryDirectory.h"
+#include "platform/testing/TestFiles.h"
 
 namespace marrowdale::native {
 namespace {
@@ -18,7 +18,7 @@ class DirectoryReaderTest : public testing::Test {
   protected:
     void makeFiles(int count) const {
         for (int i = 0; i < count; ++i) {
-            std::ofstream(root_ + "/file" + std::to_string(i));
+            writeFile(root_ + "/file" + std::to_string(i), "");
         }
     }
     [[nodiscard]] DirectoryReader reader(std::size_t bufferBytes) const {
@@ -48,8 +48,8 @@ TEST_F(DirectoryReaderTest, readsEveryEntryOnceThroughManyBuffers) {
 
 TEST_F(DirectoryReaderTest, leavesDotAndDotDotOutAndKeepsNamesThatBeginWithDots) {
     makeFiles(1);
-    std::ofstream(root_ + "/...");
-    std::ofstream(root_ + "/.a");
+    writeFile(root_ + "/...", "");
+    writeFile(root_ + "/.a", "");
     DirectoryReader folder = reader(8192);
     EXPECT_EQ(namesOf(folder), (std::set<std::string>{"file0", "...", ".a"}));
 }
@@ -103,6 +103,7 @@ TEST_F(DirectoryReaderTest, opensFoldersBeyondTheLongestPath) {
     std::string path;
     UniqueFD at(::open(root_.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
     for (int depth = 0; depth < 40; ++depth) {
+        ASSERT_TRUE(at);
         ASSERT_EQ(::mkdirat(at.get(), name.c_str(), 0700), 0);
         at.reset(::openat(at.get(), name.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
         path += (path.empty() ? "" : "/") + name;

@@ -1,7 +1,6 @@
 #include <cerrno>
 #include <fcntl.h>
 #include <filesystem>
-#include <fstream>
 #include <string>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
@@ -11,6 +10,7 @@
 
 #include "platform/linux/files/EntryStatus.h"
 #include "platform/testing/TemporaryDirectory.h"
+#include "platform/testing/TestFiles.h"
 #include "platform/testing/TestSkip.h"
 
 namespace marrowdale::native {
@@ -25,7 +25,7 @@ class EntryStatusTest : public testing::Test {
 };
 
 TEST_F(EntryStatusTest, saysWhatStatSays) {
-    std::ofstream(at("file")) << "12345";
+    writeFile(at("file"), "12345");
     ASSERT_EQ(::chmod(at("file").c_str(), 0640), 0);
     struct stat expected{};
     ASSERT_EQ(::stat(at("file").c_str(), &expected), 0);
@@ -42,7 +42,7 @@ TEST_F(EntryStatusTest, saysWhatStatSays) {
 }
 
 TEST_F(EntryStatusTest, looksAtALinkItselfAndAtItsTargetWhenAsked) {
-    std::ofstream(at("file")) << "12345";
+    writeFile(at("file"), "12345");
     std::filesystem::create_symlink("file", at("link"));
     std::filesystem::create_symlink("nowhere", at("dangling"));
     std::filesystem::create_symlink("loop", at("loop"));
@@ -64,8 +64,8 @@ TEST_F(EntryStatusTest, looksAtAnOpenFile) {
 }
 
 TEST_F(EntryStatusTest, fingerprintStaysThroughARenameAndDiffersBetweenFiles) {
-    std::ofstream(at("a"));
-    std::ofstream(at("b"));
+    writeFile(at("a"), "");
+    writeFile(at("b"), "");
     const auto first = handleFingerprint(AT_FDCWD, at("a").c_str());
     ASSERT_TRUE(first);
     if (*first == 0) {
@@ -79,14 +79,14 @@ TEST_F(EntryStatusTest, fingerprintStaysThroughARenameAndDiffersBetweenFiles) {
 
 TEST_F(EntryStatusTest, fingerprintTellsTheNextFileOfAnInodeNumberApart) {
     for (int round = 0; round < 50; ++round) {
-        std::ofstream(at("a"));
+        writeFile(at("a"), "");
         const FileID number = statEntry(AT_FDCWD, at("a").c_str())->fileID;
         const std::uint32_t fingerprint = *handleFingerprint(AT_FDCWD, at("a").c_str());
         if (fingerprint == 0) {
             MARROWDALE_SKIP("the file system of the temporary folder gives no file handles");
         }
         std::filesystem::remove(at("a"));
-        std::ofstream(at("b"));
+        writeFile(at("b"), "");
         if (statEntry(AT_FDCWD, at("b").c_str())->fileID == number) {
             EXPECT_NE(fingerprint, *handleFingerprint(AT_FDCWD, at("b").c_str()));
         }

@@ -239,6 +239,7 @@ TEST_P(LinuxDirectoryEnumeratorTest, thousandsOfLevelsNeedFewDescriptors) {
     constexpr int levels = 3000;
     UniqueFD at(::open(world_.folder.path().c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
     for (int i = 0; i < levels; ++i) {
+        ASSERT_TRUE(at);
         ASSERT_EQ(::mkdirat(at.get(), "d", 0700), 0);
         ASSERT_EQ(::mkdirat(at.get(), "e", 0700), 0);
         at.reset(::openat(at.get(), "d", O_PATH | O_DIRECTORY | O_CLOEXEC));
