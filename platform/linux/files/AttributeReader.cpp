@@ -29,6 +29,7 @@ bool namesNothing(const std::string& name) {
 
 Expected<Data> readWholeValue(const AttributeCalls::InFolder& folder, const char* name,
                               const char* systemName) {
+    // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the kernel fills it, once an item
     std::array<std::uint8_t, valueRoom> room;
     ssize_t size = folder.get(name, systemName, room);
     if (size >= 0) {
@@ -52,8 +53,8 @@ Expected<Data> readWholeValue(const AttributeCalls::InFolder& folder, const char
 }
 
 AttributeReader::AttributeReader(std::vector<std::string> names)
-    : names_(std::make_shared<const std::vector<std::string>>(std::move(names))) {
-    fingerprint_ = names_->size();
+    : names_(std::make_shared<const std::vector<std::string>>(std::move(names))),
+      fingerprint_(names_->size()) {
     for (const std::string& name : *names_) {
         systemNames_.push_back(namesNothing(name) ? std::string() : systemAttributeName(name));
         fingerprint_ = fingerprint_ * 0x100000001B3U + std::hash<std::string>()(name);
@@ -66,6 +67,7 @@ AttributeReader::AttributeReader(std::vector<std::string> names)
 
 AttributeReader::Answer AttributeReader::read(const AttributeCalls::InFolder& folder,
                                               const char* name) const {
+    // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the kernel fills it, once an item
     std::array<char, listRoom> room;
     ssize_t size = folder.list(name, room);
     if (size >= 0) {

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <fnmatch.h>
+#include <ranges>
 #include <tuple>
 #include <utility>
 
@@ -55,6 +56,8 @@ std::bitset<256> bytesOf(std::string_view element, bool caseSensitive) {
 
 // A name as a C string, as it is and folded, without an allocation.
 struct NameText {
+    // Made for each name that is looked up, and written as far as it is read.
+    // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init)
     explicit NameText(std::string_view name) {
         const std::size_t size = std::min(name.size(), longestName);
         for (std::size_t i = 0; i < size; ++i) {
@@ -102,8 +105,8 @@ void MimeGlobs::freeze() {
     std::vector<Building> tree(1);
     for (std::uint32_t index = 0; index < globs_.size(); ++index) {
         std::uint32_t at = 0;
-        for (auto c = globs_[index].text.rbegin(); c != globs_[index].text.rend(); ++c) {
-            const unsigned char byte = folded(byteOf(*c));
+        for (const char c : std::views::reverse(globs_[index].text)) {
+            const unsigned char byte = folded(byteOf(c));
             const auto& children = tree[at].children;
             const auto known =
                 std::ranges::find(children, byte, &std::pair<unsigned char, std::uint32_t>::first);

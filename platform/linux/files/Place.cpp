@@ -25,8 +25,8 @@ Error asNotServed(Error error) {
 
 }  // namespace
 
-Place::Place(const URL& url, const ServedTrees& trees, std::string name)
-    : url_(url), trees_(trees), directory_(AT_FDCWD), name_(std::move(name)) {}
+Place::Place(URL url, const ServedTrees& trees, std::string name)
+    : url_(std::move(url)), trees_(trees), name_(std::move(name)) {}
 
 Expected<Place> Place::of(const URL& url, const ServedTrees& trees) {
     if (!url.isFileURL()) {

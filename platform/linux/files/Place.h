@@ -1,5 +1,6 @@
 #pragma once
 
+#include <fcntl.h>
 #include <optional>
 #include <string>
 
@@ -42,7 +43,7 @@ class Place {
     [[nodiscard]] Expected<OpenedFolder> openFolder() const;
 
   private:
-    Place(const URL& url, const ServedTrees& trees, std::string name);
+    Place(URL url, const ServedTrees& trees, std::string name);
 
     [[nodiscard]] static Expected<Place> outside(const URL& url, const ServedTrees& trees);
     [[nodiscard]] static Expected<Place> inside(const URL& url,
@@ -55,7 +56,7 @@ class Place {
     const ServedTrees& trees_;
     std::optional<DeviceID> device_;  // of the served tree
     UniqueFD folder_;                 // unless the folder is a root, or none
-    int directory_;
+    int directory_ = AT_FDCWD;
     std::string name_;
 };
 
