@@ -222,6 +222,7 @@ TEST(URLTest, aURLMadeAnewHasNoValues) {
 
 TEST(URLTest, copiesShareTheirValuesAndEqualURLsDoNot) {
     const URL url = URL::fileURL("/a");
+    // NOLINTNEXTLINE(performance-unnecessary-copy-initialization): it is what is tested
     const URL copy = url;
     EXPECT_TRUE(copy.setCachedResourceValue(ResourceKey::fileID, Number(std::uint64_t{5})));
     EXPECT_EQ(url.cachedResourceValue(ResourceKey::fileID),
