@@ -12,6 +12,7 @@ namespace {
 
 std::optional<std::string> resolved(const std::string& path) {
     struct Free {
+        // NOLINTNEXTLINE(cppcoreguidelines-no-malloc): realpath allocates with malloc
         void operator()(char* text) const { std::free(text); }
     };
     const std::unique_ptr<char, Free> text(::realpath(path.c_str(), nullptr));
