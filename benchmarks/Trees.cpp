@@ -1,5 +1,6 @@
 #include "benchmarks/Trees.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstddef>
 #include <fcntl.h>
@@ -23,7 +24,8 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr std::uint64_t filesOfOneFolder(const Tree& tree) {
-    return tree.folders == 0 ? tree.files : tree.files / tree.folders;
+    const std::uint64_t files = tree.folders == 0 ? tree.files : tree.files / tree.folders;
+    return std::max<std::uint64_t>(files, 1);
 }
 
 std::string folderPath(const Tree& tree, std::uint64_t number) {
