@@ -10,8 +10,10 @@ namespace {
 
 std::string currentFolder() {
     struct Free {
+        // NOLINTNEXTLINE(cppcoreguidelines-no-malloc): getcwd allocates with malloc
         void operator()(char* text) const { std::free(text); }
     };
+    // NOLINTNEXTLINE(clang-analyzer-unix.StdCLibraryFunctions): without room it makes its own
     const std::unique_ptr<char, Free> folder(::getcwd(nullptr, 0));
     // A working folder outside the process's root is told as "(unreachable)/…".
     return folder && *folder == '/' ? std::string(folder.get()) : "/";

@@ -83,7 +83,7 @@ std::shared_ptr<JournalSink> JournalSink::connect(const std::string& socketPath)
     socketPath.copy(std::begin(address.sun_path), socketPath.size());
     UniqueFD socket(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
     // The system's interface takes every kind of address through a pointer to its common part.
-    const auto* const plain = static_cast<const sockaddr*>(static_cast<const void*>(&address));
+    const auto* const plain = reinterpret_cast<const sockaddr*>(&address);
     if (!socket || ::connect(socket.get(), plain, sizeof(address)) != 0) {
         return nullptr;
     }

@@ -20,7 +20,7 @@ class Journal {
         sockaddr_un address{};
         address.sun_family = AF_UNIX;
         path().copy(std::begin(address.sun_path), sizeof(address.sun_path) - 1);
-        const auto* plain = static_cast<const sockaddr*>(static_cast<const void*>(&address));
+        const auto* plain = reinterpret_cast<const sockaddr*>(&address);
         EXPECT_EQ(::bind(socket_.get(), plain, sizeof(address)), 0);
     }
     [[nodiscard]] std::string path() const { return folder_.path("socket"); }

@@ -25,7 +25,7 @@ std::string quoted(std::string_view path) {
 // The folder that an XDG variable names, or its place below the home folder; none without both.
 std::optional<std::string> folderOf(const Environment& environment, std::string_view variable,
                                     std::string_view belowHome) {
-    const auto value = environment.variable(variable);
+    auto value = environment.variable(variable);
     if (value && value->starts_with('/')) {
         return value;
     }
@@ -61,6 +61,7 @@ Started<std::string> askedRoot(const SettingsOptions& options, const Environment
 
 Started<std::string> withoutLinks(const std::string& path) {
     struct Free {
+        // NOLINTNEXTLINE(cppcoreguidelines-no-malloc): realpath allocates with malloc
         void operator()(char* text) const { std::free(text); }
     };
     const std::unique_ptr<char, Free> resolved(::realpath(path.c_str(), nullptr));
