@@ -83,6 +83,7 @@ class World::Parts {
           manager(URL::fileURL(root)) {}
 
     std::unique_ptr<native::Store> store;
+    native::LinuxFileEvents fileEvents{*store};
     native::ServedTrees trees;
     Log log{nullptr, LogLevel::error};
     native::MimeTypes types;
@@ -107,7 +108,7 @@ class World::Parts {
                       .extendedAttributes = extendedAttributes,
                       .writeAccess = writeAccess,
                       .generationStore = *store,
-                      .fileEvents = *store,
+                      .fileEvents = fileEvents,
                       .applications = applications,
                       .manager = manager,
                       .shared = shared};

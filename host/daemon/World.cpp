@@ -13,6 +13,7 @@
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
 #include "platform/linux/store/Store.h"
+#include "platform/linux/streams/LinuxFileEvents.h"
 
 namespace marrowdale::host {
 
@@ -23,6 +24,7 @@ class World::Parts {
         : options_(std::move(options)),
           log_(std::move(log)),
           store_(std::move(store)),
+          fileEvents_(*store_, log_.get()),
           trees_({options_.settings.rootPath},
                  {options_.settings.stateFolder, options_.settings.cacheFolder}),
           fileSystem_({.documents = *store_,
@@ -40,7 +42,7 @@ class World::Parts {
                     .extendedAttributes = extendedAttributes_,
                     .writeAccess = writeAccess_,
                     .generationStore = *store_,
-                    .fileEvents = *store_,
+                    .fileEvents = fileEvents_,
                     .applications = applications_,
                     .manager = manager_,
                     .shared = shared_} {}
@@ -77,6 +79,7 @@ class World::Parts {
     WorldOptions options_;
     std::unique_ptr<Log> log_;
     std::unique_ptr<native::Store> store_;
+    native::LinuxFileEvents fileEvents_;
     native::ServedTrees trees_;  // after the store, which makes the folders that are kept out
     native::MimeTypes types_;
     native::PackageTypes packages_;

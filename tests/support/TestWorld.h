@@ -13,6 +13,7 @@
 #include "platform/linux/files/MimeTypes.h"
 #include "platform/linux/files/PackageTypes.h"
 #include "platform/linux/store/Store.h"
+#include "platform/linux/streams/LinuxFileEvents.h"
 #include "platform/testing/FakeApplicationRegistry.h"
 #include "platform/testing/FakeManager.h"
 #include "platform/testing/FaultInjectingFileSystem.h"
@@ -54,6 +55,7 @@ class TestWorld {
     const std::shared_ptr<RecordingLogSink> sink = std::make_shared<RecordingLogSink>();
     Log log{sink, LogLevel::debug};
     const std::unique_ptr<native::Store> store;
+    native::LinuxFileEvents fileEvents{*store};
     const native::ServedTrees trees;
     native::LinuxFileSystem realFileSystem;
     FaultInjectingFileSystem fileSystem{realFileSystem};
@@ -62,8 +64,8 @@ class TestWorld {
     FakeApplicationRegistry applications;
     FakeManager manager;
     SharedObjects shared;
-    const Platform platform{log,    fileSystem,   attributes, writeAccess, *store,
-                            *store, applications, manager,    shared};
+    const Platform platform{log,        fileSystem,   attributes, writeAccess, *store,
+                            fileEvents, applications, manager,    shared};
 };
 
 }  // namespace marrowdale

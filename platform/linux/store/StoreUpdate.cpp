@@ -244,9 +244,8 @@ Expected<void> Store::Core::listUnwatched(const TreeScope& scope) {
 
 Expected<void> Store::Core::runFull(const TreeScope& scope) {
     HintSet hints;
-    const auto whole = drain(hints);  // what the walk sees anyway
-    if (!whole) {
-        return Unexpected(whole.error());
+    if (const auto drained = drain(hints); !drained) {  // what the walk sees anyway
+        return Unexpected(drained.error());
     }
     bool isFresh = false;
     {

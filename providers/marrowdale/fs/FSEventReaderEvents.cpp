@@ -74,7 +74,8 @@ void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> event
         }
         std::optional<LogSection> section;
         if (verbose_) {
-            section.emplace(platform_.log, [&] { return " fsevents: " + marrowdale::description(event); });
+            section.emplace(platform_.log,
+                            [&] { return " fsevents: " + marrowdale::description(event); });
         }
         if (!handle(run, *delegate, event)) {
             return;
@@ -183,7 +184,9 @@ bool FSEventReader::handleItem(const Run& run, FSEventReaderDelegate& delegate,
     if (item && !otherFile) {
         logDecision([&] { return "did change " + item->description(); });
         delegate.fsEventReaderDidChangeItem(item, event);
-        return true;
+        // Without a file it is an identifier that went, from a file that stays under another.
+        const bool isIdentifierGone = says(event, FileEventFlag::gone) && !event.fileID;
+        return !isIdentifierGone || run.isStopped || tellDeletions(run, delegate, event, url);
     }
     logDecision([&] {
         const std::string text = "dropping fsevent at " + url.path();
