@@ -43,6 +43,7 @@ std::uint32_t addAttributes(int folder, std::uint32_t sum) {
         const auto end = names.find('\0');
         const std::string_view name = names.substr(0, end);
         if (name.starts_with(userPrefix)) {
+            // NOLINTNEXTLINE(bugprone-suspicious-stringview-data-usage): a NUL ends each name
             sum = addValue(folder, name.data(), addText(name, sum));
         }
         names.remove_prefix(end == std::string_view::npos ? names.size() : end + 1);

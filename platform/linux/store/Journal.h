@@ -114,7 +114,7 @@ class Journal {
     [[nodiscard]] std::uint32_t seconds() const;
     // Removes what retention gives up.
     void trim();
-    void removeSegmentsBefore(std::uint64_t number) const;
+    void removeSegmentsBefore(std::uint64_t oldest) const;
 
     StoreFolder folder_;
     StoreIdentity identity_;
