@@ -86,6 +86,9 @@ void EntryMerger::refresh(RowNumber number, const EntryLook& look) {
     values.setAge(row.age());
     values.set(Row::unreadable, row.has(Row::unreadable));
     values.fingerprint = look.fingerprint != 0 ? look.fingerprint : row.fingerprint;
+    if (look.attributes) {
+        index_.setAttributes(number, *look.attributes);
+    }
     const bool sameSize = row.isFolder() || row.size == values.size;
     const bool sameTime = row.changed == values.changed && !row.has(Row::unsure);
     // A folder's time moves with every change in it, which is told of what changed there.
@@ -150,6 +153,9 @@ RowNumber EntryMerger::addName(RowNumber folder, std::string_view name, const En
         return noRow;
     }
     changes_.appeared(added);
+    if (look.attributes) {
+        index_.setAttributes(added, *look.attributes);
+    }
     if (kin.row != noRow) {
         refreshOtherNames(added, look);
     }

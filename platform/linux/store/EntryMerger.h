@@ -1,10 +1,12 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string_view>
 
 #include "platform/foundation/Date.h"
 #include "platform/linux/files/EntryStatus.h"
+#include "platform/linux/store/CarriedAttributes.h"
 #include "platform/linux/store/Index.h"
 #include "platform/linux/store/SafeSaves.h"
 #include "platform/linux/store/TreeChanges.h"
@@ -16,6 +18,7 @@ struct EntryLook {
     EntryStatus status;
     std::uint32_t fingerprint = 0;  // of the kernel's file handle; 0 for none
     Date lookedAt;                  // before the status was read
+    std::optional<CarriedAttributes> attributes = std::nullopt;  // where they were read
 };
 
 // Brings the index to what was found at one (folder, name). The one piece of code for that,
@@ -44,6 +47,8 @@ class EntryMerger {
     // What a folder's own metadata are now (folderDigest).
     void noteFolderDigest(RowNumber folder, std::uint32_t digest);
 
+    // The file of that row was changed, as this look shows.
+    void noteChanged(RowNumber number, const EntryLook& look) { refresh(number, look); }
     // A second look, when enough time has passed to be sure of the first.
     void makeSure(RowNumber number, const EntryLook& look);
 

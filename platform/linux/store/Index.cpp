@@ -333,6 +333,26 @@ void Index::setDocument(RowNumber number, std::uint32_t document) {
     markRenewed(number);
 }
 
+const CarriedAttributes& Index::attributes(RowNumber number) const {
+    static const CarriedAttributes none;
+    const auto found = attributes_.find(number);
+    return found == attributes_.end() ? none : found->second;
+}
+
+void Index::setAttributes(RowNumber number, const CarriedAttributes& attributes) {
+    const auto known = attributes_.find(number);
+    if (known == attributes_.end() ? attributes.empty() : known->second == attributes) {
+        return;
+    }
+    if (attributes.empty()) {
+        attributes_.erase(known);
+    } else {
+        attributes_.insert_or_assign(number, attributes);
+    }
+    newAttributes_.insert(number);
+    markDirty(number);
+}
+
 void Index::remove(RowNumber number) {
     if (!row(number).has(Row::limbo) && row(number).parent != noRow) {
         putInLimbo(number);
@@ -359,6 +379,7 @@ void Index::freeRow(RowNumber number) {
         removeDocument(number);
     }
     names_.remove(entry.name);
+    setAttributes(number, {});
     markDirty(number);
     const std::uint32_t wasDirty = entry.flags & Row::dirty;
     entry = Row{};
@@ -385,6 +406,7 @@ void Index::clearDirty() {
     for (const RowNumber number : dirty_) {
         row(number).set(Row::dirty | Row::renewed, false);
     }
+    std::unordered_set<RowNumber>().swap(newAttributes_);
     std::vector<RowNumber>().swap(dirty_);  // an assignment would keep the memory
 }
 

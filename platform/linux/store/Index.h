@@ -5,8 +5,11 @@
 #include <memory>
 #include <string>
 #include <string_view>
+#include <unordered_map>
+#include <unordered_set>
 #include <vector>
 
+#include "platform/linux/store/CarriedAttributes.h"
 #include "platform/linux/store/NameArena.h"
 #include "platform/linux/store/Row.h"
 #include "platform/linux/store/RowHashTable.h"
@@ -64,6 +67,17 @@ class Index {
     // change.
     void update(RowNumber number, const Row& values);
     void setDocument(RowNumber number, std::uint32_t document);
+    // What a file carries for its document; empty for most.
+    [[nodiscard]] const CarriedAttributes& attributes(RowNumber number) const;
+    void setAttributes(RowNumber number, const CarriedAttributes& attributes);
+    // Those of rows that have some, in no order.
+    [[nodiscard]] const std::unordered_map<RowNumber, CarriedAttributes>& allAttributes() const {
+        return attributes_;
+    }
+    // Whether the log does not have the dirty row's attributes yet.
+    [[nodiscard]] bool hasNewAttributes(RowNumber number) const {
+        return newAttributes_.contains(number);
+    }
     // Frees the row (in limbo or placed) and all below it.
     void remove(RowNumber number);
 
@@ -79,6 +93,8 @@ class Index {
     // kind.
     [[nodiscard]] bool restoreTouch(RowNumber number, const Row& values);
     void freeRestoredRow(RowNumber number);
+    // False when there is no such row.
+    [[nodiscard]] bool restoreAttributes(RowNumber number, CarriedAttributes attributes);
     // Room for a chunk's worth of rows that the caller fills, in order from row 0.
     [[nodiscard]] Row* addRawRows(RowNumber count);
     [[nodiscard]] NameArena& names() { return names_; }
@@ -119,6 +135,8 @@ class Index {
     RowHashTable byName_;
     RowHashTable byFile_;
     RowHashTable byDocument_;
+    std::unordered_map<RowNumber, CarriedAttributes> attributes_;
+    std::unordered_set<RowNumber> newAttributes_;
     std::vector<RowNumber> dirty_;
     std::vector<RowNumber> limbo_;  // rows that were put there; some may be placed by now
     RowNumber endOfRows_ = rootRow;

@@ -39,7 +39,20 @@ bool Index::restoreTouch(RowNumber number, const Row& values) {
     return true;
 }
 
+bool Index::restoreAttributes(RowNumber number, CarriedAttributes attributes) {
+    if (number < rootRow || number >= endOfRows_) {
+        return false;
+    }
+    if (attributes.empty()) {
+        attributes_.erase(number);
+    } else {
+        attributes_.insert_or_assign(number, std::move(attributes));
+    }
+    return true;
+}
+
 void Index::freeRestoredRow(RowNumber number) {
+    attributes_.erase(number);
     names_.remove(row(number).name);
     row(number) = Row{};
 }

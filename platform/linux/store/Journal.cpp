@@ -95,6 +95,23 @@ Expected<void> putDirtyRows(FrameStream& out, const Index& index) {
         if (auto done = out.endRecord(); !done) {
             return done;
         }
+        if (index.hasNewAttributes(number)) {
+            putAttributes(out.records(), number, index.attributes(number));
+            if (auto done = out.endRecord(); !done) {
+                return done;
+            }
+        }
+    }
+    return {};
+}
+
+// A snapshot has none: they begin the log behind it.
+Expected<void> putAllAttributes(FrameStream& out, const Index& index) {
+    for (const auto& [number, attributes] : index.allAttributes()) {
+        putAttributes(out.records(), number, attributes);
+        if (auto done = out.endRecord(); !done) {
+            return done;
+        }
     }
     return {};
 }
@@ -141,20 +158,27 @@ Expected<void> Journal::commit(Index& index, EventBatch& events, std::uint32_t l
 
 Expected<void> Journal::writeCommit(const Index& index, const EventBatch& events,
                                     std::uint32_t lastDocument) {
+    return write(lastDocument, [&](FrameStream& out) {
+        Expected<void> done;
+        if (gapIsNew_) {
+            putGap(out.records(), gaps_.back());
+            out.countEvent();
+            done = out.endRecord();
+        }
+        if (done && lastDocument != lastDocument_) {
+            putDocumentCounter(out.records(), lastDocument);
+            done = out.endRecord();
+        }
+        done = done ? putEvents(out, events) : done;
+        return done ? putDirtyRows(out, index) : done;
+    });
+}
+
+template <typename Put>
+Expected<void> Journal::write(std::uint32_t lastDocument, const Put& put) {
     const std::uint64_t start = writer_.offset();
     FrameStream out(writer_, sequence_, lastEvent_);
-    Expected<void> done;
-    if (gapIsNew_) {
-        putGap(out.records(), gaps_.back());
-        out.countEvent();
-        done = out.endRecord();
-    }
-    if (done && lastDocument != lastDocument_) {
-        putDocumentCounter(out.records(), lastDocument);
-        done = out.endRecord();
-    }
-    done = done ? putEvents(out, events) : done;
-    done = done ? putDirtyRows(out, index) : done;
+    auto done = put(out);
     done = done ? out.finish() : done;
     if (!done) {
         // Nothing was synced: what was written can be taken back, and a later commit tried.
@@ -219,9 +243,16 @@ Expected<void> Journal::writeSnapshot(Index& index) {
         }
     }
     index.compactNames();
-    const auto bytes = native::writeSnapshot(
-        folder_.snapshot(), identity_.uuid,
-        {writer_.number(), sequence_, lastEvent_, lastDocument_}, index, gaps_);
+    const SnapshotHeader header{writer_.number(), sequence_, lastEvent_, lastDocument_};
+    if (!index.allAttributes().empty()) {
+        auto written =
+            write(lastDocument_, [&](FrameStream& out) { return putAllAttributes(out, index); });
+        if (!written) {
+            return written;
+        }
+    }
+    const auto bytes =
+        native::writeSnapshot(folder_.snapshot(), identity_.uuid, header, index, gaps_);
     if (!bytes) {
         return Unexpected(bytes.error());
     }

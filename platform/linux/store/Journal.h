@@ -109,6 +109,9 @@ class Journal {
 
     [[nodiscard]] Expected<void> writeCommit(const Index& index, const EventBatch& events,
                                              std::uint32_t lastDocument);
+    // One commit of what `put` gives to a FrameStream.
+    template <typename Put>
+    [[nodiscard]] Expected<void> write(std::uint32_t lastDocument, const Put& put);
     [[nodiscard]] Expected<void> rollSegment();
     [[nodiscard]] Expected<void> writeHead();
     [[nodiscard]] std::uint32_t seconds() const;

@@ -36,6 +36,8 @@ bool applyRecord(const Record& record, Index& index, std::vector<EventGap>& gaps
             return true;
         case Record::Type::rowTouched:
             return index.restoreTouch(record.row, record.values);
+        case Record::Type::attributes:
+            return index.restoreAttributes(record.row, record.attributes);
         case Record::Type::gap:
             gaps.push_back(record.gap);
             return true;

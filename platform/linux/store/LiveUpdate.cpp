@@ -151,6 +151,9 @@ void LiveUpdate::lookClosely(int folder, const HintSet::Hint& hint, Found& found
         found.look.status = *again;
         found.look.fingerprint = *fingerprint;
     }
+    if (found.look.status.isRegular()) {
+        found.look.attributes = scope_.carrier.read(folder, name);
+    }
     scope_.watches.watchFile(folder, name, found.look.status);
     if (found.look.status.isDirectory()) {
         const UniqueFD readable(

@@ -43,6 +43,7 @@ Reconciler::Reconciler(const TreeScope& scope)
       changes_(scope.changes),
       merger_(scope.index, scope.changes, scope.saves),
       watches_(scope.watches),
+      carrier_(scope.carrier),
       root_(scope.root),
       rootPath_(scope.rootPath),
       device_(scope.device),
@@ -111,7 +112,9 @@ void Reconciler::walk(Threads threads) {
         return;
     }
     work();
-    second.join();
+    if (second.joinable()) {
+        second.join();
+    }
 }
 
 void Reconciler::work() {
@@ -328,7 +331,9 @@ void Reconciler::mergeBatch(Visit& visit, int folder, const Batch& batch) {
             const EntryStatus& before = batch.entries[i].status;
             const bool same =
                 fingerprint && status->fileID == before.fileID && status->birth == before.birth;
-            looked.push_back({i, {*status, same ? *fingerprint : 0, batch.lookedAt}});
+            auto attributes = status->isRegular() ? carrier_.read(folder, name) : std::nullopt;
+            looked.push_back(
+                {i, {*status, same ? *fingerprint : 0, batch.lookedAt, std::move(attributes)}});
         }
     }
     const MutexLock lock(mutex_);

@@ -25,6 +25,7 @@ struct TreeScope {
     TreeChanges& changes;
     SafeSaves& saves;
     FolderWatches& watches;
+    AttributeCarrier& carrier;
     int root;  // the open root folder
     const std::string& rootPath;
     DeviceID device;
@@ -116,6 +117,7 @@ class Reconciler {
     TreeChanges& changes_ MARROWDALE_GUARDED_BY(mutex_);
     EntryMerger merger_ MARROWDALE_GUARDED_BY(mutex_);
     FolderWatches& watches_;
+    AttributeCarrier& carrier_;
     const int root_;
     const std::string& rootPath_;
     const DeviceID device_;

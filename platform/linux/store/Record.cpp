@@ -69,6 +69,15 @@ bool takeEvent(ByteReader& body, Record& record) {
            event.path.size() <= longestEventPath - record.shared;
 }
 
+bool takeAttributes(ByteReader& body, Record& record) {
+    record.row = body.take<RowNumber>();
+    while (body.ok() && body.left() > 0) {
+        std::string name(body.takeTextWithLength());
+        record.attributes.emplace_back(std::move(name), body.takeTextWithLength());
+    }
+    return body.finished() && isRowNumber(record.row);
+}
+
 bool takeBody(ByteReader& body, Record& record) {
     switch (record.type) {
         case Record::Type::rowPut:
@@ -87,6 +96,8 @@ bool takeBody(ByteReader& body, Record& record) {
             return takeTouch(body, record);
         case Record::Type::event:
             return takeEvent(body, record);
+        case Record::Type::attributes:
+            return takeAttributes(body, record);
         case Record::Type::passedOver:
             break;
     }
@@ -97,6 +108,9 @@ std::optional<Record::Type> typeOf(std::uint32_t number) {
     constexpr std::uint32_t lastPassedOver = 0x7F;
     if (number == static_cast<std::uint32_t>(Record::Type::event)) {
         return Record::Type::event;
+    }
+    if (number == static_cast<std::uint32_t>(Record::Type::attributes)) {
+        return Record::Type::attributes;
     }
     if (number >= static_cast<std::uint32_t>(Record::Type::passedOver) &&
         number <= lastPassedOver) {
@@ -139,6 +153,19 @@ void putTouch(ByteWriter& out, RowNumber number, const Row& row) {
 void putRemoval(ByteWriter& out, RowNumber number) {
     putHead(out, Record::Type::rowRemoved, sizeof number);
     out.put(number);
+}
+
+void putAttributes(ByteWriter& out, RowNumber number, const CarriedAttributes& attributes) {
+    std::size_t size = sizeof number;
+    for (const auto& [name, value] : attributes) {
+        size += 2 * sizeof(std::uint32_t) + name.size() + value.size();
+    }
+    putHead(out, Record::Type::attributes, size);
+    out.put(number);
+    for (const auto& [name, value] : attributes) {
+        out.textWithLength(name);
+        out.textWithLength(value);
+    }
 }
 
 void putGap(ByteWriter& out, const EventGap& gap) {

@@ -7,6 +7,7 @@
 #include <string_view>
 
 #include "platform/linux/store/Bytes.h"
+#include "platform/linux/store/CarriedAttributes.h"
 #include "platform/linux/store/EventBatch.h"
 #include "platform/linux/store/Row.h"
 
@@ -27,6 +28,7 @@ struct Record {
         documentCounter = 0x04,
         rowTouched = 0x05,
         event = 0x40,
+        attributes = 0x42,
         passedOver = 0x41,  // and up to 0x7F: nothing of the index
     };
     Type type = Type::passedOver;
@@ -39,11 +41,13 @@ struct Record {
     // of the event before it in the frame, and lies in the bytes that were read.
     StoredEvent event;
     std::uint64_t shared = 0;
+    CarriedAttributes attributes;  // attributes: all that the row has
 };
 
 void putRow(ByteWriter& out, RowNumber number, const Row& row, std::string_view name);
 void putTouch(ByteWriter& out, RowNumber number, const Row& row);
 void putRemoval(ByteWriter& out, RowNumber number);
+void putAttributes(ByteWriter& out, RowNumber number, const CarriedAttributes& attributes);
 void putGap(ByteWriter& out, const EventGap& gap);
 void putDocumentCounter(ByteWriter& out, std::uint32_t last);
 

@@ -114,10 +114,35 @@ TEST(RecordTest, AnEventTakesFewBytesBesideItsPath) {
     EXPECT_EQ(record->event.goneDocument, DocumentID{});
 }
 
+TEST(RecordTest, AttributesComeBackWhole) {
+    const CarriedAttributes attributes{{"user.a", std::string("\0\xff", 2)}, {"user.b", ""}};
+    ByteWriter out;
+    putAttributes(out, 7, attributes);
+    putAttributes(out, 8, {});
+    RecordReader reader(out.bytes());
+    const auto first = reader.next();
+    ASSERT_TRUE(first);
+    EXPECT_EQ(first->type, Record::Type::attributes);
+    EXPECT_EQ(first->row, 7U);
+    EXPECT_EQ(first->attributes, attributes);
+    const auto second = reader.next();
+    ASSERT_TRUE(second);
+    EXPECT_TRUE(second->attributes.empty());
+    EXPECT_FALSE(reader.next());
+    EXPECT_TRUE(reader.isGood());
+    for (std::size_t length = 1; length < out.bytes().size(); ++length) {
+        RecordReader cut(out.bytes().first(length));
+        while (cut.next()) {
+        }
+        const bool isBoundary = cut.isGood();
+        EXPECT_EQ(isBoundary, length == out.bytes().size() - 8) << length;
+    }
+}
+
 TEST(RecordTest, TypesOfLaterProgramsThatTellNothingOfTheIndexArePassedOver) {
     for (std::uint32_t type = 0; type <= 0xFF; ++type) {
         const bool isPassed = type > 0x40 && type <= 0x7F;
-        if (!isPassed && ((type >= 1 && type <= 5) || type == 0x40)) {
+        if ((type >= 1 && type <= 5) || type == 0x40 || type == 0x42) {
             continue;
         }
         ByteWriter out;

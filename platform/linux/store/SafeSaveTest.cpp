@@ -4,9 +4,11 @@
 #include <fcntl.h>
 #include <functional>
 #include <sys/stat.h>
+#include <sys/xattr.h>
 #include <unistd.h>
 
 #include "platform/linux/store/StoreEventsTestSupport.h"
+#include "platform/testing/TestSkip.h"
 
 namespace marrowdale::native {
 namespace {
@@ -15,11 +17,17 @@ using testing::Contains;
 using testing::HasSubstr;
 using testing::Not;
 
+constexpr const char* tagName = "user.com.quillory.favorite-rank.number#PS";
+constexpr std::string_view tag("a\0tag", 5);
+
 class SafeSaveTest : public StoreEventsTest {
   protected:
+    bool hasTags_ = false;
+
     // A document "doc" that was told of, and what goes with it.
     DocumentID beginWithDocument() {
         write("doc", "first");
+        hasTags_ = ::setxattr(path("doc").c_str(), tagName, tag.data(), tag.size(), 0) == 0;
         write("other", "x");
         makeFolder(path("folder"));
         begin();
@@ -27,6 +35,12 @@ class SafeSaveTest : public StoreEventsTest {
         (void)news();
         settle();
         return document;
+    }
+    [[nodiscard]] std::string tagOf(const std::string& below) const {
+        std::string value(100, ' ');
+        const auto size = ::getxattr(path(below).c_str(), tagName, value.data(), value.size());
+        value.resize(size < 0 ? 0 : static_cast<std::size_t>(size));
+        return value;
     }
     void exchange(const std::string& a, const std::string& b) {
         ASSERT_EQ(
@@ -38,6 +52,9 @@ class SafeSaveTest : public StoreEventsTest {
         EXPECT_EQ(placeOf(document), name);
         EXPECT_EQ(documentOf(name), document);
         EXPECT_THAT(texts, Contains("moved document"));
+        if (hasTags_) {
+            EXPECT_EQ(tagOf(name), tag) << "tags stay with the document";
+        }
         // A program that saves in two steps may be seen in between; then it is there again.
         EXPECT_THAT(texts, Contains(HasSubstr(" " + name)));
     }
@@ -228,6 +245,58 @@ TEST_P(SafeSaveTest, ACopyIsAnother) {
     std::filesystem::copy_file(path("doc"), path("copy"));
     expectNew(document, "copy");
     EXPECT_EQ(placeOf(document), "doc");
+}
+
+TEST_P(SafeSaveTest, TagsThatTheNewFileHasAreItsOwn) {
+    const auto document = beginWithDocument();
+    if (!hasTags_) {
+        MARROWDALE_SKIP("this file system keeps no user attributes");
+    }
+    write("temporary", "second");
+    ASSERT_EQ(::setxattr(path("temporary").c_str(), tagName, "own", 3, 0), 0);
+    rename("temporary", "doc");
+    (void)news();
+    EXPECT_EQ(documentOf("doc"), document);
+    EXPECT_EQ(tagOf("doc"), "own");
+}
+
+TEST_P(SafeSaveTest, TagsSetLaterStayTooAndThoseTakenAwayDont) {
+    const auto document = beginWithDocument();
+    if (!hasTags_) {
+        MARROWDALE_SKIP("this file system keeps no user attributes");
+    }
+    ASSERT_EQ(::removexattr(path("doc").c_str(), tagName), 0);
+    ASSERT_EQ(::setxattr(path("doc").c_str(), "user.com.quillory.later", "l", 1, 0), 0);
+    ASSERT_EQ(::setxattr(path("doc").c_str(), "user.somebody.else", "s", 1, 0), 0);
+    (void)news();
+    write("temporary", "second");
+    rename("temporary", "doc");
+    (void)news();
+    EXPECT_EQ(documentOf("doc"), document);
+    EXPECT_EQ(tagOf("doc"), "");
+    char value = 0;
+    EXPECT_EQ(::getxattr(path("doc").c_str(), "user.com.quillory.later", &value, 1), 1);
+    EXPECT_EQ(::getxattr(path("doc").c_str(), "user.somebody.else", &value, 1), -1)
+        << "what belongs to the file goes with it";
+}
+
+TEST_P(SafeSaveTest, TagsComeWhenTheFileCanBeWritten) {
+    if (::geteuid() == 0) {
+        MARROWDALE_SKIP_FOR_USER("permissions don't bind root");
+    }
+    const auto document = beginWithDocument();
+    if (!hasTags_ || !isLive()) {
+        MARROWDALE_SKIP("nobody waits for it after a restart");
+    }
+    write("temporary", "second");
+    ASSERT_EQ(::chmod(path("temporary").c_str(), 0400), 0);
+    rename("temporary", "doc");
+    (void)news();
+    EXPECT_EQ(documentOf("doc"), document);
+    EXPECT_EQ(tagOf("doc"), "");
+    ASSERT_EQ(::chmod(path("doc").c_str(), 0600), 0);
+    (void)news();
+    EXPECT_EQ(tagOf("doc"), tag);
 }
 
 TEST_P(SafeSaveTest, WhatIsMovedOutAndBackIsTheSame) {

@@ -101,6 +101,7 @@ void SafeSaves::add(TreeChanges::Departure departure, Clock::time_point now,
     if (!row.isFree() && row.fileID == raw(departure.file)) {
         vacancy.fingerprint = row.fingerprint;
         vacancy.birth = row.birth;
+        vacancy.attributes = index_.attributes(departure.row);
     }
     const Number number = next_++;
     byName_.emplace(Name{vacancy.folder, vacancy.name}, number);
@@ -257,21 +258,22 @@ void SafeSaves::transfer(const Vacancy& vacancy, RowNumber taker, DeviceID devic
     }
     changes_.changed(taker);
     changes_.documentMoved(device, vacancy.document, raw(vacancy.file), index_.row(taker).fileID);
-    transfers_.push_back({vacancy.document, taker});
+    transfers_.push_back({vacancy.document, taker, vacancy.attributes});
 }
 
 void SafeSaves::exchange(const Vacancy& vacancy, RowNumber taker, RowNumber old, DeviceID device) {
     const std::uint32_t other = index_.row(taker).document;
+    const CarriedAttributes others = index_.attributes(taker);
     setDocument(taker, 0);
     setDocument(old, other);
     setDocument(taker, vacancy.document);
     changes_.changed(taker);
     changes_.changed(old);
     changes_.documentMoved(device, vacancy.document, raw(vacancy.file), index_.row(taker).fileID);
-    transfers_.push_back({vacancy.document, taker});
+    transfers_.push_back({vacancy.document, taker, vacancy.attributes});
     if (other != 0) {
         changes_.documentMoved(device, other, index_.row(taker).fileID, index_.row(old).fileID);
-        transfers_.push_back({other, old});
+        transfers_.push_back({other, old, others});
     }
 }
 

@@ -51,6 +51,7 @@ class SafeSaves {
     struct Transfer {
         std::uint32_t document = 0;
         RowNumber to = noRow;
+        CarriedAttributes attributes;  // of the earlier file
     };
 
     SafeSaves(Index& index, TreeChanges& changes) : index_(index), changes_(changes) {}
@@ -84,6 +85,7 @@ class SafeSaves {
         std::uint32_t fingerprint = 0;
         std::int64_t birth = 0;
         Clock::time_point since;
+        CarriedAttributes attributes;
         bool wasRenamed = false;  // and not unlinked at once
         Came taken;
     };

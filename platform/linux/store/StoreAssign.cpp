@@ -150,7 +150,7 @@ Expected<UniqueFD> Store::Core::folderOf(const Request& request) const {
     return isThatFolder ? std::move(folder) : Expected<UniqueFD>();
 }
 
-void Store::Core::lookAgain(int folder, const Request& request, Looked& looked) const {
+void Store::Core::lookAgain(int folder, const Request& request, Looked& looked) {
     const std::string name(request.name);
     const auto fingerprint = handleFingerprint(folder, name.c_str());
     const auto status = statEntry(folder, name.c_str());
@@ -158,12 +158,14 @@ void Store::Core::lookAgain(int folder, const Request& request, Looked& looked) 
         status->fileID == request.status.fileID && status->birth == request.status.birth) {
         looked.look.status = *status;
         looked.look.fingerprint = *fingerprint;
+        looked.look.attributes =
+            status->isRegular() ? carrier_.read(folder, name.c_str()) : std::nullopt;
         looked.stands = true;
     }
 }
 
 Expected<std::vector<Store::Core::Looked>> Store::Core::lookAtEntries(
-    std::span<const Request> requests, std::span<const std::size_t> unknown) const {
+    std::span<const Request> requests, std::span<const std::size_t> unknown) {
     std::vector<Looked> all;
     UniqueFD folder;
     std::optional<std::string_view> folderPath;

@@ -122,6 +122,9 @@ class Store::Core {
     void noteRootProblem(const std::optional<Error>& problem) MARROWDALE_EXCLUDES(mutex_);
     void settle(SafeSaves::Knowledge knowledge) MARROWDALE_EXCLUDES(mutex_);
     void removeLimbo() MARROWDALE_REQUIRES(mutex_);
+    void carryAttributes() MARROWDALE_EXCLUDES(mutex_);
+    void noteCarried(const Place& place, const CarriedAttributes& attributes)
+        MARROWDALE_EXCLUDES(mutex_);
     void makeSure() MARROWDALE_EXCLUDES(mutex_);
     void finishUpdates() MARROWDALE_EXCLUDES(mutex_);
     // The pass takes the mutex by itself; requests wait because of `updating_`.
@@ -152,9 +155,9 @@ class Store::Core {
     [[nodiscard]] Expected<void> refuseForeign(std::span<const Request> requests,
                                                std::span<const std::size_t> unknown) const;
     [[nodiscard]] Expected<UniqueFD> folderOf(const Request& request) const;
-    void lookAgain(int folder, const Request& request, Looked& looked) const;
-    [[nodiscard]] Expected<std::vector<Looked>> lookAtEntries(
-        std::span<const Request> requests, std::span<const std::size_t> unknown) const;
+    void lookAgain(int folder, const Request& request, Looked& looked);
+    [[nodiscard]] Expected<std::vector<Looked>> lookAtEntries(std::span<const Request> requests,
+                                                              std::span<const std::size_t> unknown);
     [[nodiscard]] Expected<void> giveOut(std::span<Request> requests,
                                          std::span<const Looked> looked)
         MARROWDALE_EXCLUDES(mutex_);
@@ -181,6 +184,7 @@ class Store::Core {
     StoreIdentity identity_;
 
     const PackageTypes packages_;
+    AttributeCarrier carrier_;
 
     Mutex mutex_;
     std::condition_variable_any idle_;  // a pass ended
@@ -203,7 +207,9 @@ class Store::Core {
     const StoreOptions::Recording recording_;
     const std::optional<Watcher::Kind> watcherKind_;
     std::unique_ptr<Watcher> watcher_;  // set while opening; none without
-    bool mustLookAtAll_ = false;        // touched by the pass that runs
+    // Touched by the pass that runs.
+    bool mustLookAtAll_ = false;
+    std::vector<SafeSaves::Transfer> uncarried_;  // whose attributes could not be written yet
     std::unique_ptr<FolderWatches> watches_;
     UniqueFD stop_;  // an event counter: the recorder is to end
     std::thread recorder_;

@@ -39,6 +39,7 @@ Store::Core::Core(const StoreOptions& options, StateFolder state, StoreFolder fo
       lock_(std::move(lock)),
       root_(std::move(root)),
       packages_(options.packages != nullptr ? *options.packages : PackageTypes()),
+      carrier_(options.carriedAttributePrefix),
       changes_(index_, packages_),
       saves_(index_, changes_),
       recording_(options.recording),

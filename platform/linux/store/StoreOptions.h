@@ -36,6 +36,9 @@ struct StoreOptions {
     std::optional<std::chrono::milliseconds> lockWait = std::chrono::milliseconds(0);
     // May be null. Must outlive the store.
     Log* log = nullptr;
+    // Extended attributes whose names (without the system's prefix) begin so belong to documents:
+    // they are kept, and put on the file in which a document comes to rest, where it has none.
+    std::string carriedAttributePrefix = "com.quillory.";
     Recording recording = Recording::once;
     // The kind of watcher to use; none: the best there is.
     std::optional<Watcher::Kind> watcher = std::nullopt;

@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <ctime>
 #include <fcntl.h>
+#include <iterator>
 #include <utility>
 
 #include "platform/linux/store/DiskCheck.h"
@@ -48,6 +49,7 @@ TreeScope Store::Core::scope() {
             .changes = changes_,
             .saves = saves_,
             .watches = *watches_,
+            .carrier = carrier_,
             .root = root_.get(),
             .rootPath = rootPath_,
             .device = device_,
@@ -278,9 +280,49 @@ Expected<void> Store::Core::runFull(const TreeScope& scope) {
 }
 
 void Store::Core::settle(SafeSaves::Knowledge knowledge) {
+    {
+        const MutexLock lock(mutex_);
+        auto transfers = saves_.settle(device_, knowledge, SafeSaves::Clock::now());
+        std::ranges::move(transfers, std::back_inserter(uncarried_));
+        removeLimbo();
+    }
+    carryAttributes();
+}
+
+// A file that can't be written to now may be so later; until then it has no tags, and the store
+// keeps them.
+void Store::Core::carryAttributes() {
+    std::vector<SafeSaves::Transfer> left;
+    for (SafeSaves::Transfer& transfer : std::exchange(uncarried_, {})) {
+        std::vector<Place> places;
+        {
+            const MutexLock lock(mutex_);
+            if (index_.row(transfer.to).document == transfer.document) {
+                addPlace(transfer.to, places);
+            }
+        }
+        if (places.empty() || transfer.attributes.empty()) {
+            continue;
+        }
+        const Place& place = places.front();
+        const auto outcome =
+            carrier_.write(root_.get(), place.path, FileID{place.row.fileID}, transfer.attributes);
+        if (outcome == AttributeCarrier::Outcome::refused) {
+            left.push_back(std::move(transfer));
+        } else if (outcome == AttributeCarrier::Outcome::written) {
+            noteCarried(place, transfer.attributes);
+        }
+    }
+    uncarried_ = std::move(left);
+}
+
+void Store::Core::noteCarried(const Place& place, const CarriedAttributes& attributes) {
+    auto look = lookBeneath(root_.get(), place.path, place.row);
     const MutexLock lock(mutex_);
-    (void)saves_.settle(device_, knowledge, SafeSaves::Clock::now());
-    removeLimbo();
+    if (look && EntryMerger::isSameFile(index_.row(place.number), *look, true)) {
+        look->attributes = attributes;
+        EntryMerger(index_, changes_, saves_).noteChanged(place.number, *look);
+    }
 }
 
 void Store::Core::removeLimbo() {
