@@ -21,6 +21,15 @@ void FolderWatches::watchFolder(int folder, FileID number, bool isRoot) {
     }
 }
 
+void FolderWatches::noteUnwatched(FileID number, const std::string& reason) {
+    if (watcher_ == nullptr) {
+        return;
+    }
+    const MutexLock lock(mutex_);
+    unwatched_.insert(number);
+    problem_ = reason;
+}
+
 void FolderWatches::watchFile(int folder, const char* name, const EntryStatus& status) {
     if (watcher_ == nullptr || !status.isRegular() || status.linkCount <= 1) {
         return;

@@ -23,6 +23,8 @@ class FolderWatches {
     [[nodiscard]] bool isWatching() const { return watcher_ != nullptr; }
     // Watches the folder that is open, before its entries are read.
     void watchFolder(int folder, FileID number, bool isRoot) MARROWDALE_EXCLUDES(mutex_);
+    // A folder that can't be opened, so not watched either: nobody tells when it can be.
+    void noteUnwatched(FileID number, const std::string& reason) MARROWDALE_EXCLUDES(mutex_);
     // A file that has several names may be changed through one that nobody watches.
     void watchFile(int folder, const char* name, const EntryStatus& status)
         MARROWDALE_EXCLUDES(mutex_);

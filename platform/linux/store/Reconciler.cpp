@@ -70,7 +70,7 @@ Expected<ReconcileReport> Reconciler::walkUntilSettled(Threads threads) {
     for (int round = 0; round < mostRounds && !settled_; ++round) {
         walk(threads);
         // What changes in a watched folder after it was listed is told.
-        settled_ = watches_.isWatching() || !pushChangedFolders();
+        settled_ = (watches_.isWatching() && watches_.isComplete()) || !pushChangedFolders();
     }
     const MutexLock lock(mutex_);
     if (failure_) {
@@ -172,6 +172,7 @@ void Reconciler::noteUnreadable(const Visit& visit) {
     if (status) {
         const MutexLock lock(mutex_);
         merger_.noteFolderDigest(visit.folder, folderDigest(-1, *status));
+        watches_.noteUnwatched(status->fileID, "can't read " + visit.path);
     }
 }
 
