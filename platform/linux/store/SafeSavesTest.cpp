@@ -1,0 +1,126 @@
+// How long a name is waited for: the rest is tried on real files (SafeSaveTest.cpp).
+
+#include <gtest/gtest.h>
+
+#include "platform/linux/store/EntryMerger.h"
+#include "platform/linux/store/SafeSaves.h"
+
+namespace marrowdale::native {
+namespace {
+
+constexpr FileID folder{2};
+constexpr std::uint32_t document = 7;
+
+class SafeSavesTest : public testing::Test {
+  protected:
+    SafeSavesTest() {
+        (void)index_.add(noRow, {}, EntryMerger::valuesOf(look(raw(folder), 0040755U)));
+        const RowNumber old = appear("doc", 10);
+        index_.setDocument(old, document);
+    }
+    static EntryLook look(std::uint64_t file, std::uint32_t mode = 0100644U) {
+        EntryLook look;
+        look.status.fileID = FileID{file};
+        look.status.mode = mode;
+        look.status.linkCount = 1;
+        look.status.hasBirth = true;
+        look.status.birth = {static_cast<std::int64_t>(file), 0};
+        look.status.changed = {1000, 0};
+        look.lookedAt = {2000, 0};
+        return look;
+    }
+    RowNumber appear(std::string_view name, std::uint64_t file) {
+        return merger_.merge(rootRow, name, look(file));
+    }
+    void vanish(std::string_view name) { merger_.noteAbsent(rootRow, name); }
+    std::vector<SafeSaves::Transfer> settleAt(std::chrono::seconds time) {
+        auto transfers = saves_.settle(DeviceID{1}, SafeSaves::Knowledge::live,
+                                       SafeSaves::Clock::time_point(time));
+        for (const RowNumber number : index_.limboRows()) {
+            changes_.remove(number);
+        }
+        return transfers;
+    }
+    [[nodiscard]] std::uint32_t documentAt(std::string_view name) const {
+        const RowNumber row = index_.child(rootRow, name);
+        return row == noRow ? 0 : index_.row(row).document;
+    }
+    void arriveBy(std::string_view name, SafeSaves::Arrival how, std::string_view from = {}) {
+        saves_.arrived(folder, name, how, from);
+    }
+
+    // doc is renamed to some name, another file takes its place, and at last it is deleted.
+    void saveThroughAnotherName(std::chrono::seconds deleted) {
+        appear("aside", 10);
+        arriveBy("aside", SafeSaves::Arrival::renamedWithin, "doc");
+        appear("doc", 11);
+        arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+        EXPECT_TRUE(settleAt(std::chrono::seconds(100)).empty());
+        EXPECT_EQ(documentAt("aside"), document) << "until it is known to be a save";
+        vanish("aside");
+        (void)settleAt(deleted);
+    }
+
+    Index index_;
+    PackageTypes packages_;
+    TreeChanges changes_{index_, packages_};
+    SafeSaves saves_{index_, changes_};
+    EntryMerger merger_{index_, changes_, saves_};
+};
+
+TEST_F(SafeSavesTest, AFileRenamedOntoAnUnlinkedNameInTime) {
+    vanish("doc");
+    EXPECT_TRUE(settleAt(std::chrono::seconds(100)).empty());
+    appear("doc", 11);
+    arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+    EXPECT_EQ(settleAt(std::chrono::seconds(115)).size(), 1U);
+    EXPECT_EQ(documentAt("doc"), document);
+}
+
+TEST_F(SafeSavesTest, AFileRenamedOntoAnUnlinkedNameTooLate) {
+    vanish("doc");
+    (void)settleAt(std::chrono::seconds(100));
+    appear("doc", 11);
+    arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+    EXPECT_TRUE(settleAt(std::chrono::seconds(116)).empty());
+    EXPECT_EQ(documentAt("doc"), 0U);
+}
+
+TEST_F(SafeSavesTest, TheEarlierFileIsDeletedInTime) {
+    saveThroughAnotherName(std::chrono::seconds(115));
+    EXPECT_EQ(documentAt("doc"), document);
+}
+
+TEST_F(SafeSavesTest, TheEarlierFileIsDeletedTooLate) {
+    saveThroughAnotherName(std::chrono::seconds(116));
+    EXPECT_EQ(documentAt("doc"), 0U);
+}
+
+TEST_F(SafeSavesTest, AnUnlinkedNameThatIsMadeAnew) {
+    vanish("doc");
+    (void)settleAt(std::chrono::seconds(100));
+    appear("doc", 11);
+    arriveBy("doc", SafeSaves::Arrival::made);
+    EXPECT_TRUE(settleAt(std::chrono::seconds(101)).empty());
+    EXPECT_EQ(documentAt("doc"), 0U);
+}
+
+TEST_F(SafeSavesTest, AFileThatComesBackInTimeHasItsIdentifierBack) {
+    vanish("doc");
+    (void)settleAt(std::chrono::seconds(100));
+    EXPECT_EQ(documentAt("doc"), 0U);
+    appear("elsewhere", 10);
+    EXPECT_EQ(documentAt("elsewhere"), document);
+}
+
+TEST_F(SafeSavesTest, AnotherFileOfThatNumberDoesNot) {
+    vanish("doc");
+    (void)settleAt(std::chrono::seconds(100));
+    auto other = look(10);
+    other.status.birth = {99, 0};
+    (void)merger_.merge(rootRow, "elsewhere", other);
+    EXPECT_EQ(documentAt("elsewhere"), 0U);
+}
+
+}  // namespace
+}  // namespace marrowdale::native
