@@ -28,6 +28,7 @@ class HintSet {
     void add(const WatchHint& hint);
     void add(const Hint& hint);
     [[nodiscard]] bool empty() const { return places_.empty() && files_.empty(); }
+    [[nodiscard]] std::size_t size() const { return places_.size() + files_.size(); }
     // Everything so far, the places of each folder together; nothing is left.
     [[nodiscard]] std::vector<Hint> takePlaces();
     // Watched files of which something was told.

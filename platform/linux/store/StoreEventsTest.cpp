@@ -176,6 +176,7 @@ TEST_P(StoreEventsTest, WhatLiesInAPackageIsAChangeOfThePackage) {
     remove("doc.bundle/text");
     EXPECT_THAT(newsOnce(), ElementsAre("changed doc.bundle"));
     const auto document = documentOf("doc.bundle");
+    settle();
     (void)news();
     remove("doc.bundle");
     EXPECT_THAT(newsOnce(),

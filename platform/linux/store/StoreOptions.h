@@ -19,6 +19,8 @@ struct StoreOptions {
     enum class Recording : std::uint8_t {
         // Looks at the tree when it is opened, and when something is asked that it does not know.
         once,
+        // Listens, and works through what it was told when somebody wants to know.
+        whenAsked,
         // Goes on listening, on a thread of its own, and records what happens as it happens.
         live,
     };

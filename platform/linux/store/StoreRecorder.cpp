@@ -21,7 +21,7 @@ constexpr int pauseAfterFailure = 1000;
 
 // Before the first walk, which watches each folder that it lists.
 void Store::Core::startWatching() {
-    if (recording_ == StoreOptions::Recording::live) {
+    if (recording_ != StoreOptions::Recording::once) {
         auto watcher = makeWatcher(root_.get(), watcherKind_);
         if (watcher) {
             watcher_ = std::move(*watcher);
@@ -34,7 +34,7 @@ void Store::Core::startWatching() {
 }
 
 void Store::Core::startRecorder() {
-    if (!watcher_) {
+    if (!watcher_ || recording_ != StoreOptions::Recording::live) {
         return;
     }
     stop_.reset(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));

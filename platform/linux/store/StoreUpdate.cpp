@@ -70,7 +70,7 @@ Expected<void> Store::Core::lookForMissing() {
 }
 
 Expected<EventID> Store::Core::barrier() {
-    if (recording_ == StoreOptions::Recording::live) {
+    if (recording_ != StoreOptions::Recording::once) {
         if (auto done = lookForMissing(); !done) {
             return Unexpected(done.error());
         }
@@ -196,18 +196,20 @@ Expected<bool> Store::Core::followHints(const TreeScope& scope) {
     HintSet hints;
     LiveUpdate update(scope);
     std::vector<HintSet::Hint> unreached;
+    bool hasProgressed = false;
     for (int round = 0; round < mostRounds; ++round) {
         const auto whole = drain(hints);
         if (!whole || !*whole) {
             return whole;
         }
-        if (hints.empty()) {
+        // What could not be reached is worth another try when something moved.
+        if (hints.empty() && (unreached.empty() || !hasProgressed)) {
             break;
         }
-        // Worth another try only now that something moved.
         for (const HintSet::Hint& hint : std::exchange(unreached, {})) {
             hints.add(hint);
         }
+        const std::size_t count = hints.size();
         auto left = update.process(hints);
         if (!left) {
             return Unexpected(left.error());
@@ -218,6 +220,7 @@ Expected<bool> Store::Core::followHints(const TreeScope& scope) {
             }
         }
         unreached = std::move(left->hints);
+        hasProgressed = unreached.size() < count;
         const MutexLock lock(mutex_);
         if (unreached.empty() && !index_.hasLimbo()) {
             break;
