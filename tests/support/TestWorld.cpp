@@ -16,8 +16,8 @@ std::string madeRoot(const TemporaryDirectory& directory) {
 }
 
 std::unique_ptr<native::Store> openedStore(const TemporaryDirectory& directory,
-                                           const std::string& rootPath, Log& log) {
-    native::StoreOptions options;
+                                           const std::string& rootPath, Log& log,
+                                           native::StoreOptions options) {
     options.stateFolder = directory.path("state");
     options.cacheFolder = directory.path("cache");
     options.rootPath = rootPath;
@@ -31,9 +31,9 @@ std::unique_ptr<native::Store> openedStore(const TemporaryDirectory& directory,
 
 }  // namespace
 
-TestWorld::TestWorld(const TemporaryDirectory& directory)
+TestWorld::TestWorld(const TemporaryDirectory& directory, native::StoreOptions storeOptions)
     : rootPath_(madeRoot(directory)),
-      store(openedStore(directory, rootPath_, log)),
+      store(openedStore(directory, rootPath_, log, std::move(storeOptions))),
       trees({rootPath_}, {directory.path("state"), directory.path("cache")}),
       realFileSystem(native::FileSources{.documents = *store,
                                          .types = types_,

@@ -31,8 +31,9 @@ namespace marrowdale {
 class TestWorld {
   public:
     // Makes the storage root when it is missing. `directory` lives longer. Throws
-    // std::runtime_error where the store can't be opened.
-    explicit TestWorld(const TemporaryDirectory& directory);
+    // std::runtime_error where the store can't be opened. `storeOptions` say how it is opened, but
+    // for where things lie and for the log, which are the world's.
+    explicit TestWorld(const TemporaryDirectory& directory, native::StoreOptions storeOptions = {});
     TestWorld(const TestWorld&) = delete;
     TestWorld& operator=(const TestWorld&) = delete;
 

@@ -1,0 +1,38 @@
+#pragma once
+
+#include <cstdint>
+#include <random>
+#include <string>
+
+namespace marrowdale::tests {
+
+// Does to a tree what programs and people do, at random: files, folders, renames, moves, hard
+// links, safe saves, deletes of trees, hidden names, packages, exchanges, links, metadata. Names
+// are few, so that they meet; what a step needs and does not find, it leaves undone. One thread.
+class RandomWriter {
+  public:
+    RandomWriter(std::string root, std::uint32_t seed) : root_(std::move(root)), random_(seed) {}
+
+    void step();
+    void steps(int count) {
+        for (int i = 0; i < count; ++i) {
+            step();
+        }
+    }
+
+  private:
+    [[nodiscard]] unsigned upTo(unsigned count) { return static_cast<unsigned>(random_()) % count; }
+    // Of a folder or file that may be there.
+    [[nodiscard]] std::string folder();
+    [[nodiscard]] std::string file();
+    void write(const std::string& path);
+    void append(const std::string& path);
+    void rename(const std::string& from, const std::string& to, unsigned flags = 0) const;
+    void moveFolder();
+    void save();
+
+    const std::string root_;
+    std::mt19937 random_;
+};
+
+}  // namespace marrowdale::tests
