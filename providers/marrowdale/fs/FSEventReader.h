@@ -29,8 +29,9 @@ enum class FSEventReaderMode : std::uint8_t {
 // An event is a hint. What stands at its path is looked at when the event is handled, and the item
 // is made from that. An event that says that a file is gone is told as the file's deletion when
 // nothing, or another file, stands at the path by now; where the same file stands there again it is
-// a change. A path is hidden when a component of it below the monitored folder begins with ".";
-// what is hidden, or outside all monitored folders, is never told.
+// a change, and where that file is another document now, the earlier one is told as deleted:
+// numbers of files are given out again. A path is hidden when a component of it below the monitored
+// folder begins with "."; what is hidden, or outside all monitored folders, is never told.
 //
 // An event of the feed of documents is told as a change of the item that holds the document now,
 // wherever that is; so it runs through the same looks (hidden, monitored, present, servable) with
@@ -133,6 +134,10 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
                                   std::optional<FileID> otherFile) const;
     [[nodiscard]] bool tellDeletions(const Run& run, FSEventReaderDelegate& delegate,
                                      const FileEvent& event, const URL& url) const;
+    // False when the reader was stopped before.
+    [[nodiscard]] bool tellDeletion(const Run& run, FSEventReaderDelegate& delegate,
+                                    const FileEvent& event, const URL& url,
+                                    const std::string& identifier) const;
     [[nodiscard]] Place placeOf(const URL& url) const;
     // At debug level, for a verbose reader.
     template <typename MakeText>

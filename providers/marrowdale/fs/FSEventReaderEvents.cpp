@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <array>
 #include <utility>
 
@@ -184,9 +185,14 @@ bool FSEventReader::handleItem(const Run& run, FSEventReaderDelegate& delegate,
     if (item && !otherFile) {
         logDecision([&] { return "did change " + item->description(); });
         delegate.fsEventReaderDidChangeItem(item, event);
-        // Without a file it is an identifier that went, from a file that stays under another.
-        const bool isIdentifierGone = says(event, FileEventFlag::gone) && !event.fileID;
-        return !isIdentifierGone || run.isStopped || tellDeletions(run, delegate, event, url);
+        // An identifier that went, from a file that stays under another, or from one whose number
+        // the file that stands here was given.
+        const bool isIdentifierGone = says(event, FileEventFlag::gone) &&
+                                      event.goneDocument != DocumentID{} &&
+                                      item->docID != raw(event.goneDocument);
+        return !isIdentifierGone ||
+               tellDeletion(run, delegate, event, url,
+                            MRWFileObjectIdentifier::fromDocumentID(raw(event.goneDocument)));
     }
     logDecision([&] {
         const std::string text = "dropping fsevent at " + url.path();
@@ -212,13 +218,19 @@ bool FSEventReader::tellDeletions(const Run& run, FSEventReaderDelegate& delegat
         logDecision(
             [&] { return "dropping fsevent at " + quoted(url.path()) + "; No object at path"; });
     }
-    for (const std::string& identifier : identifiers) {
-        if (run.isStopped) {
-            return false;
-        }
-        logDecision([&] { return "did delete " + identifier; });
-        delegate.fsEventReaderDidDeleteItem(identifier, url.path(), event);
+    return std::ranges::all_of(identifiers, [&](const std::string& identifier) {
+        return tellDeletion(run, delegate, event, url, identifier);
+    });
+}
+
+bool FSEventReader::tellDeletion(const Run& run, FSEventReaderDelegate& delegate,
+                                 const FileEvent& event, const URL& url,
+                                 const std::string& identifier) const {
+    if (run.isStopped) {
+        return false;
     }
+    logDecision([&] { return "did delete " + identifier; });
+    delegate.fsEventReaderDidDeleteItem(identifier, url.path(), event);
     return true;
 }
 

@@ -176,8 +176,17 @@ TEST_P(FSEventReaderEventsTest, aFileWhosePlaceWasTakenByWhatIsNoItemIsGoneToo) 
 
 TEST_P(FSEventReaderEventsTest, aGoneFileThatIsThereAgainDidChange) {
     writeFile(world_.path("a"), "");
-    tell({gone("a", fileIDOf("a"), 77)});
+    tell({gone("a", fileIDOf("a"))});
     EXPECT_EQ(delegate_->told, Lines{"change a 11"});
+    const auto document = static_cast<std::uint32_t>(delegate_->items.back()->docID.value());
+    tell({gone("a", fileIDOf("a"), document)});
+    EXPECT_EQ(delegate_->told, (Lines{"change a 11", "change a 12"}));
+}
+
+TEST_P(FSEventReaderEventsTest, aDocumentIsGoneWhereItsFilesNumberWasGivenToAnother) {
+    writeFile(world_.path("a"), "");
+    tell({gone("a", fileIDOf("a"), 77)});
+    EXPECT_EQ(delegate_->told, (Lines{"change a 11", "delete did=77 " + world_.path("a") + " 11"}));
 }
 
 TEST_P(FSEventReaderEventsTest, hiddenPathsAreDropped) {
