@@ -285,8 +285,8 @@ TEST_P(SafeSaveTest, TagsComeWhenTheFileCanBeWritten) {
         MARROWDALE_SKIP_FOR_USER("permissions don't bind root");
     }
     const auto document = beginWithDocument();
-    if (!hasTags_ || !isLive()) {
-        MARROWDALE_SKIP("nobody waits for it after a restart");
+    if (!hasTags_) {
+        MARROWDALE_SKIP("this file system keeps no user attributes");
     }
     write("temporary", "second");
     ASSERT_EQ(::chmod(path("temporary").c_str(), 0400), 0);
@@ -296,7 +296,7 @@ TEST_P(SafeSaveTest, TagsComeWhenTheFileCanBeWritten) {
     EXPECT_EQ(tagOf("doc"), "");
     ASSERT_EQ(::chmod(path("doc").c_str(), 0600), 0);
     (void)news();
-    EXPECT_EQ(tagOf("doc"), tag);
+    EXPECT_EQ(tagOf("doc"), isLive() ? tag : "") << "what waits does not outlast a restart";
 }
 
 TEST_P(SafeSaveTest, WhatIsMovedOutAndBackIsTheSame) {
