@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <optional>
 
 #include <fmt/format.h>
 
@@ -68,6 +69,16 @@ void append(std::vector<Finding>& findings, std::vector<Finding> more) {
     std::ranges::move(more, std::back_inserter(findings));
 }
 
+std::vector<Finding> worldFindings(const World& world) {
+    const native::StoreReport report = world.storeReport();
+    const std::string& root = world.settings().rootPath;
+    std::vector<Finding> findings = listeningFindings(
+        report.recorder.isLive ? report.recorder : triedRecorder(root), report.reconcile.folders);
+    append(findings, storeFindings(report, mountsBelow(root)));
+    append(findings, historyFindings(report, world.retention()));
+    return findings;
+}
+
 }  // namespace
 
 void DoctorCommand::declareArguments(CLI::App& /*arguments*/) {}
@@ -90,8 +101,12 @@ Outcome DoctorCommand::run(CommandContext& context) {
     append(findings, machineFindings(context.environment()));
     const auto world = context.world();
     if (world) {
-        append(findings, storeFindings((*world)->storeReport(), mountsBelow(*root)));
-    } else if (root && state) {
+        append(findings, worldFindings(**world));
+    } else {
+        append(findings,
+               root ? listeningFindings(triedRecorder(*root), std::nullopt) : listeningFindings());
+    }
+    if (!world && root && state) {
         findings.push_back({"provider", FindingStatus::problem, world.error().message,
                             "Without this nothing can be listed; mend it first."});
     }

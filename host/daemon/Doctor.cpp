@@ -3,7 +3,6 @@
 #include <cerrno>
 #include <fcntl.h>
 #include <filesystem>
-#include <fstream>
 #include <ranges>
 #include <sys/xattr.h>
 #include <system_error>
@@ -114,31 +113,6 @@ Finding typesFinding(const Environment& environment) {
             "Install the package shared-mime-info."};
 }
 
-Finding watcherFinding() {
-    return {"watcher",
-            FindingStatus::note,
-            "none: each command brings the index up to what is on disk when it starts",
-            {}};
-}
-
-std::string kernelLimit(const std::string& name) {
-    std::ifstream file("/proc/sys/fs/" + name);
-    std::string value;
-    return file >> value ? value : "unknown";
-}
-
-Finding limitsFinding() {
-    return {"limits",
-            FindingStatus::ok,
-            fmt::format(
-                "fanotify: {} marks, {} groups, {} queued events; inotify: {} watches, {} "
-                "instances (none in use by this program)",
-                kernelLimit("fanotify/max_user_marks"), kernelLimit("fanotify/max_user_groups"),
-                kernelLimit("fanotify/max_queued_events"), kernelLimit("inotify/max_user_watches"),
-                kernelLimit("inotify/max_user_instances")),
-            {}};
-}
-
 }  // namespace
 
 std::string_view statusName(FindingStatus status) {
@@ -179,7 +153,7 @@ Finding stateFinding(const std::string& stateFolder, const std::string& rootPath
 }
 
 std::vector<Finding> machineFindings(const Environment& environment) {
-    return {typesFinding(environment), watcherFinding(), limitsFinding()};
+    return {typesFinding(environment)};
 }
 
 }  // namespace marrowdale::host

@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <chrono>
 
 #include <fmt/format.h>
 
@@ -60,14 +59,6 @@ Finding identifiersFinding(const StoreReport& report) {
     return finding;
 }
 
-Finding historyFinding(const StoreReport& report) {
-    return {"history",
-            FindingStatus::note,
-            fmt::format("no events are kept yet; the count of events is at {}",
-                        raw(report.lastEventID)),
-            {}};
-}
-
 Finding rebuildFinding(const StoreReport& report) {
     if (report.rebuildReason.empty()) {
         return {"rebuild", FindingStatus::ok, "this store has replaced no earlier one", {}};
@@ -99,17 +90,6 @@ Finding writingFinding(const StoreReport& report) {
     return {"writing", FindingStatus::problem,
             "the store can't be written: " + report.writeError->description(),
             "Known documents are served, new ones get no identifier until this is mended."};
-}
-
-Finding reconcileFinding(const StoreReport& report) {
-    using Milliseconds = std::chrono::duration<double, std::milli>;
-    const auto& last = report.reconcile;
-    return {
-        "reconcile",
-        FindingStatus::ok,
-        fmt::format("looked at {} entries in {} folders in {:.1f} ms; {} differed", last.entries,
-                    last.folders, Milliseconds(last.duration).count(), last.differences),
-        {}};
 }
 
 std::string firstOf(const std::vector<std::string>& paths, std::uint64_t count) {
@@ -186,11 +166,9 @@ std::vector<Finding> storeFindings(const StoreReport& report,
             journalFinding(report),
             memoryFinding(report),
             identifiersFinding(report),
-            historyFinding(report),
             rebuildFinding(report),
             witnessFinding(report),
             writingFinding(report),
-            reconcileFinding(report),
             mountsFinding(report, mounts),
             pathsFinding("unreadable-folders", "unreadable folders",
                          absolutePaths(report, last.unreadableFolders), last.unreadableFolderCount,

@@ -74,6 +74,7 @@ class World::Parts {
     [[nodiscard]] const ItemRequests& requests() const { return *requests_; }
     [[nodiscard]] const Settings& settings() const { return options_.settings; }
     [[nodiscard]] const native::Store& store() const { return *store_; }
+    [[nodiscard]] const native::Retention& retention() const { return options_.retention; }
 
   private:
     WorldOptions options_;
@@ -124,7 +125,8 @@ Expected<std::unique_ptr<native::Store>> openStore(const WorldOptions& options, 
                                .cacheFolder = options.settings.cacheFolder,
                                .rootPath = options.settings.rootPath,
                                .lockWait = std::min(options.quietWait, options.lockWait),
-                               .log = &log};
+                               .log = &log,
+                               .retention = options.retention};
     auto opened = native::Store::open(store);
     if (opened || !isHeldByAnother(opened.error()) || options.quietWait >= options.lockWait) {
         return opened;
@@ -171,6 +173,10 @@ const Settings& World::settings() const {
 
 native::StoreReport World::storeReport() const {
     return parts_->store().report();
+}
+
+const native::Retention& World::retention() const {
+    return parts_->retention();
 }
 
 }  // namespace marrowdale::host

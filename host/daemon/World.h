@@ -8,6 +8,7 @@
 #include "host/daemon/Settings.h"
 #include "host/daemon/StartFailure.h"
 #include "platform/foundation/Log.h"
+#include "platform/linux/store/Retention.h"
 #include "platform/linux/store/StoreReport.h"
 
 namespace marrowdale::host {
@@ -17,6 +18,8 @@ struct WorldOptions {
     std::shared_ptr<LogSink> logSink;  // null: nothing is logged
     LogLevel logThreshold = LogLevel::error;
     std::string modulePath;
+    // How much history is kept.
+    native::Retention retention = {};
     // How long to wait for another process that has the state folder.
     std::chrono::milliseconds lockWait = std::chrono::minutes(1);
     // How much of that passes before people are told; and how they are told, with one line of text
@@ -47,6 +50,7 @@ class World {
     [[nodiscard]] const ItemRequests& requests() const;
     [[nodiscard]] const Settings& settings() const;
     [[nodiscard]] native::StoreReport storeReport() const;
+    [[nodiscard]] const native::Retention& retention() const;
 
   private:
     class Parts;

@@ -43,9 +43,28 @@ TEST_P(DoctorTest, eachFindingIsALineWithNameStatusAndMessage) {
                     ::testing::Contains(text(one, "status")));
         EXPECT_FALSE(text(one, "message").empty());
     }
-    for (const char* name : {"root", "trash", "file-system", "extended-attributes", "state",
-                             "types", "watcher", "limits", "store", "stores", "journal", "memory",
-                             "history", "rebuild", "reconcile", "mounts", "unreadable-folders"}) {
+    for (const char* name : {"root",
+                             "trash",
+                             "file-system",
+                             "extended-attributes",
+                             "state",
+                             "types",
+                             "watcher",
+                             "limits",
+                             "store",
+                             "stores",
+                             "journal",
+                             "memory",
+                             "history",
+                             "rebuild",
+                             "reconcile",
+                             "mounts",
+                             "unreadable-folders",
+                             "marks",
+                             "unwatched-folders",
+                             "overflow",
+                             "history-problem",
+                             "root-place"}) {
         EXPECT_TRUE(names.contains(name)) << name;
     }
     EXPECT_EQ(finding(findings, "trash")["status"], "ok");
@@ -116,6 +135,27 @@ TEST_P(DoctorTest, theStoresOfAllRootsAreCounted) {
     EXPECT_THAT(text(stores, "message"), ::testing::HasSubstr("2 stores"));
     EXPECT_THAT(text(stores, "message"), ::testing::HasSubstr(home_.root()));
     EXPECT_FALSE(text(stores, "advice").empty());
+}
+
+TEST_P(DoctorTest, whatWouldListenIsTriedOnTheRoot) {
+    makeFolder(home_.document("one/two"));
+    const auto findings = home_.lines({"doctor"});
+    const Json watcher = finding(findings, "watcher");
+    EXPECT_EQ(watcher["status"], "ok");
+    EXPECT_THAT(text(watcher, "message"), ::testing::HasSubstr("would use fanotify"));
+    EXPECT_THAT(text(finding(findings, "marks"), "message"), ::testing::HasSubstr(" 3 of "));
+}
+
+TEST_P(DoctorTest, theHistoryIsCountedFromItsOldestEvent) {
+    EXPECT_THAT(text(finding(home_.lines({"doctor"}), "history"), "message"),
+                ::testing::StartsWith("no events yet"));
+    writeFile(home_.document("a.txt"), "x");
+    const auto findings = home_.lines({"doctor"});
+    EXPECT_THAT(text(finding(findings, "history"), "message"), ::testing::HasSubstr("events in"));
+    EXPECT_THAT(text(finding(findings, "history"), "message"),
+                ::testing::HasSubstr("the oldest is number"));
+    EXPECT_EQ(finding(findings, "history-problem")["status"], "ok");
+    EXPECT_EQ(finding(findings, "root-place")["status"], "ok");
 }
 
 TEST_P(DoctorTest, itLeavesNothingInTheDocuments) {
