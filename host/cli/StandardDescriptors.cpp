@@ -13,8 +13,13 @@ bool fillStandardDescriptors() {
             continue;
         }
         // The lowest free number is this one, for those below it are taken. Reading only: what is
-        // written must be refused, not lost in silence.
-        if (::open("/dev/null", O_RDONLY) != descriptor) {
+        // written must be refused, not lost in silence. A folder refuses reading too, and is there
+        // where a sandbox has no devices.
+        int opened = ::open("/dev/null", O_RDONLY);
+        if (opened < 0) {
+            opened = ::open("/", O_RDONLY | O_DIRECTORY);
+        }
+        if (opened != descriptor) {
             return false;
         }
     }
