@@ -3,7 +3,6 @@
 #include <functional>
 #include <set>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <gmock/gmock.h>
 
@@ -246,7 +245,7 @@ TEST_P(HistoryTest, aFileThatIsPutAsideUnderAnotherNameTakesItsIdentifierAlong) 
 }
 
 TEST_P(HistoryTest, aListingUnderWhichThingsAreDeletedEndsWell) {
-    constexpr int count = 2000;  // more than a pipe holds
+    constexpr int count = 2000;  // whose lines are more than a pipe holds
     makeFiles(count);
     makeFolder(home_.document("folder"));
     for (int i = 0; i < count; ++i) {
@@ -256,8 +255,7 @@ TEST_P(HistoryTest, aListingUnderWhichThingsAreDeletedEndsWell) {
     for (int i = 1; i < count; i += 2) {
         staying.insert("file " + std::to_string(i));
     }
-    Arguments arguments{"--json", "ls", "root"};
-    ChildProcess listing(home_.command(arguments));
+    ChildProcess listing(home_.command({"--json", "ls", "root"}));
     ASSERT_FALSE(listing.readOutput(1, std::chrono::minutes(1)).empty());
     for (int i = 0; i < count; i += 2) {
         remove("file " + std::to_string(i));
