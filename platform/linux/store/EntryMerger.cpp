@@ -24,7 +24,9 @@ bool isUnsure(const Date& changed, const Date& lookedAt) {
 }  // namespace
 
 bool EntryMerger::isUnchanged(const Row& row, const EntryStatus& status) {
-    return row.fileID == raw(status.fileID) && row.changed == rowTime(status.changed) &&
+    // A power cut may take back what was written and leave the time of it.
+    const bool sameSize = row.isFolder() || row.size == status.size;
+    return row.fileID == raw(status.fileID) && row.changed == rowTime(status.changed) && sameSize &&
            !row.has(Row::unsure) && row.birth == rowBirth(status) && row.kind() == rowKind(status);
 }
 

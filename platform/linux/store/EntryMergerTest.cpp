@@ -1,0 +1,47 @@
+#include <gtest/gtest.h>
+
+#include "platform/linux/store/EntryMerger.h"
+
+namespace marrowdale::native {
+namespace {
+
+constexpr std::uint32_t fileMode = 0100644;
+constexpr std::uint32_t folderMode = 0040755;
+
+// Something that was changed long before it was looked at.
+EntryLook lookAt(std::uint32_t mode) {
+    EntryLook look;
+    look.status.fileID = FileID{12};
+    look.status.mode = mode;
+    look.status.size = 4096;
+    look.status.birth = {1'000, 0};
+    look.status.hasBirth = true;
+    look.status.changed = {2'000, 0};
+    look.lookedAt = {3'000, 0};
+    return look;
+}
+
+TEST(EntryMergerTest, TheSameStatusIsNoChange) {
+    for (const std::uint32_t mode : {fileMode, folderMode}) {
+        const EntryLook look = lookAt(mode);
+        EXPECT_TRUE(EntryMerger::isUnchanged(EntryMerger::valuesOf(look), look.status)) << mode;
+    }
+}
+
+// After a power cut ext4 has files with the times of a write, and without what was written.
+TEST(EntryMergerTest, AnotherSizeIsAChangeWhateverTheTimesSay) {
+    const EntryLook look = lookAt(fileMode);
+    EntryStatus cut = look.status;
+    cut.size = 0;
+    EXPECT_FALSE(EntryMerger::isUnchanged(EntryMerger::valuesOf(look), cut));
+}
+
+TEST(EntryMergerTest, TheSizeOfAFolderMeansNothing) {
+    const EntryLook look = lookAt(folderMode);
+    EntryStatus grown = look.status;
+    grown.size = 8192;
+    EXPECT_TRUE(EntryMerger::isUnchanged(EntryMerger::valuesOf(look), grown));
+}
+
+}  // namespace
+}  // namespace marrowdale::native
