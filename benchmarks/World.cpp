@@ -11,6 +11,7 @@
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/streams/LinuxFileEvents.h"
 #include "providers/marrowdale/LocalFileProvider.h"
 
 namespace marrowdale::benchmarks {
