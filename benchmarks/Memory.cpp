@@ -1,11 +1,14 @@
 #include <array>
 #include <fstream>
 #include <iostream>
+#include <optional>
 #include <sstream>
 #include <stdexcept>
+#include <string_view>
 
 #include <fmt/format.h>
 
+#include "benchmarks/History.h"
 #include "benchmarks/Peer.h"
 #include "benchmarks/Suite.h"
 #include "benchmarks/World.h"
@@ -35,8 +38,11 @@ struct MemoryUse {
     double entries = 0;  // in the index
 };
 
-MemoryUse measure(const Tree& tree, bool listing) {
-    const auto lines = outputOf({"/proc/self/exe", listing ? "--memory-of-listing" : "--memory",
+constexpr std::array<const char*, 3> arguments{"--memory-of-index", "--memory-of-listing",
+                                               "--memory-of-recording"};
+
+MemoryUse measure(const Tree& tree, MemoryOf what) {
+    const auto lines = outputOf({"/proc/self/exe", arguments.at(static_cast<std::size_t>(what)),
                                  tree.path, Suite::stateFolder(tree)});
     MemoryUse use;
     std::istringstream(lines.at(0)) >> use.before >> use.opened >> use.peak >> use.entries;
@@ -49,12 +55,39 @@ std::string megabytes(double bytes) {
 
 }  // namespace
 
-void printMemory(const std::string& root, const std::string& state, bool listing) {
+std::optional<MemoryOf> memoryArgument(std::string_view argument) {
+    for (const MemoryOf what : {MemoryOf::index, MemoryOf::listing, MemoryOf::recording}) {
+        if (argument == arguments.at(static_cast<std::size_t>(what))) {
+            return what;
+        }
+    }
+    return std::nullopt;
+}
+
+namespace {
+
+void printMemoryOfRecording(const std::string& root, const std::string& state) {
+    const std::uint64_t before = memory("VmRSS");
+    const auto store = openLiveStore(root, state);
+    native::LinuxFileEvents events(*store);
+    CountingStream stream(events, root, recorded(*store));
+    stream.waitForHistory();
+    std::cout << before << ' ' << memory("VmRSS") << ' ' << memory("VmHWM") << ' '
+              << store->report().entries << '\n';
+}
+
+}  // namespace
+
+void printMemory(const std::string& root, const std::string& state, MemoryOf what) {
+    if (what == MemoryOf::recording) {
+        printMemoryOfRecording(root, state);
+        return;
+    }
     const std::uint64_t before = memory("VmRSS");
     World world(root, state);
     const std::uint64_t opened = memory("VmRSS");
     forgetPeak();
-    if (listing) {
+    if (what == MemoryOf::listing) {
         listPages(world, containerOf(false));
     }
     std::cout << before << ' ' << opened << ' ' << memory("VmHWM") << ' '
@@ -67,11 +100,11 @@ void compareMemory(Suite& suite) {
     makeTree(small);
     makeTree(large);
     // Once before, so that every file has its identifier and the stores are what they will be.
-    (void)measure(small, true);
-    (void)measure(large, true);
-    const MemoryUse index = measure(large, false);
-    const MemoryUse smallListing = measure(small, true);
-    const MemoryUse largeListing = measure(large, true);
+    (void)measure(small, MemoryOf::listing);
+    (void)measure(large, MemoryOf::listing);
+    const MemoryUse index = measure(large, MemoryOf::index);
+    const MemoryUse smallListing = measure(small, MemoryOf::listing);
+    const MemoryUse largeListing = measure(large, MemoryOf::listing);
 
     suite.table.heading("Memory, resident");
     suite.table.add(
@@ -80,6 +113,22 @@ void compareMemory(Suite& suite) {
          .against = "100 B",
          .ratio = (index.opened - index.before) / index.entries / 100,
          .target = 1.0});
+    const MemoryUse recording = measure(large, MemoryOf::recording);
+    const Tree empty{suite.folder + "/empty", 0, 0, false};
+    makeTree(empty);
+    const MemoryUse nothing = measure(empty, MemoryOf::recording);
+    const double recordedEntry = (recording.opened - nothing.opened) / recording.entries;
+    suite.table.add({.what = "an entry of a store that records, its folders watched",
+                     .measured = fmt::format("{:.0f} B", recordedEntry),
+                     .against = "100 B",
+                     .ratio = recordedEntry / 100,
+                     .target = 1.0});
+    constexpr double allowed = 32 * 1024 * 1024;
+    suite.table.add({.what = "the rest: a store that records an empty folder, whole process",
+                     .measured = megabytes(nothing.opened),
+                     .against = megabytes(allowed),
+                     .ratio = nothing.opened / allowed,
+                     .target = 1.0});
     const double perEntry =
         (largeListing.peak - largeListing.opened) - (smallListing.peak - smallListing.opened);
     suite.table.add({.what = fmt::format("what listing {} files adds, against listing {}",

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <optional>
 #include <string>
+#include <string_view>
 
 #include "benchmarks/Table.h"
 #include "benchmarks/Trees.h"
@@ -24,6 +26,11 @@ struct Suite {
     [[nodiscard]] Tree largeTree() const {
         return {folder + "/large", sizes.manyFolders, sizes.manyFiles, false};
     }
+    [[nodiscard]] Tree longNamedTree() const {
+        Tree tree{folder + "/long-names", sizes.folders, sizes.files, false};
+        tree.hasLongNames = true;
+        return tree;
+    }
     // Where the store of a tree's world lies; beside it, so that both are on one disk.
     [[nodiscard]] static std::string stateFolder(const Tree& tree) { return tree.path + ".state"; }
 };
@@ -34,9 +41,15 @@ void comparePaging(Suite& suite);
 void compareLookUps(Suite& suite);
 void compareReconcile(Suite& suite);
 void compareMemory(Suite& suite);
+void compareRecording(Suite& suite);
+void compareReplays(Suite& suite);
+void compareStoreSize(Suite& suite);
+void compareWatchman(Suite& suite);
 
+enum class MemoryOf { index, listing, recording };
+[[nodiscard]] std::optional<MemoryOf> memoryArgument(std::string_view argument);
 // For compareMemory, which measures in fresh processes: runs as one of them, and prints one line
 // "before after peak entries".
-void printMemory(const std::string& root, const std::string& state, bool listing);
+void printMemory(const std::string& root, const std::string& state, MemoryOf what);
 
 }  // namespace marrowdale::benchmarks

@@ -28,11 +28,12 @@ void Table::add(Row row) {
 }
 
 void Table::heading(std::string text) {
-    rows_.push_back({.what = "**" + std::move(text) + "**",
-                     .measured = {},
-                     .against = {},
-                     .ratio = 0,
-                     .target = {}});
+    note("**" + std::move(text) + "**");
+}
+
+void Table::note(std::string text) {
+    rows_.push_back(
+        {.what = std::move(text), .measured = {}, .against = {}, .ratio = 0, .target = {}});
 }
 
 void Table::print(std::ostream& stream) const {

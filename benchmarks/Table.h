@@ -23,6 +23,8 @@ class Table {
     };
     void add(Row row);
     void heading(std::string text);
+    // A line for what is left out, and why.
+    void note(std::string text);
     void print(std::ostream& stream) const;
 
   private:

@@ -29,7 +29,11 @@ constexpr std::uint64_t filesOfOneFolder(const Tree& tree) {
 }
 
 std::string folderPath(const Tree& tree, std::uint64_t number) {
-    return tree.folders == 0 ? tree.path : fmt::format("{}/folder {:05}", tree.path, number);
+    if (tree.folders == 0) {
+        return tree.path;
+    }
+    return fmt::format("{}/folder {:05}{}", tree.path, number,
+                       tree.hasLongNames ? " with a name of middle length" : "");
 }
 
 Data archived(const ArchivedObject& object) {
@@ -87,8 +91,9 @@ void makeTree(const Tree& tree) {
 }
 
 std::string filePath(const Tree& tree, std::uint64_t number) {
-    return fmt::format("{}/document number {:07}.txt",
-                       folderPath(tree, number / filesOfOneFolder(tree)), number);
+    return fmt::format("{}/document number {:07}{}.txt",
+                       folderPath(tree, number / filesOfOneFolder(tree)), number,
+                       tree.hasLongNames ? " and little more" : "");
 }
 
 }  // namespace marrowdale::benchmarks

@@ -11,6 +11,7 @@ struct Tree {
     std::uint64_t folders = 0;  // below `path`; 0: the files lie in it directly
     std::uint64_t files = 0;
     bool hasAttributes = false;  // three a file: last-used date, tags, favourite rank
+    bool hasLongNames = false;   // paths of 85 bytes below `path`
     [[nodiscard]] std::uint64_t entries() const { return folders + files; }
 };
 
@@ -22,8 +23,19 @@ struct Sizes {
     std::uint64_t manyFiles;
     std::uint64_t lookUps;  // identifiers that are looked up
     int rounds;
-    static constexpr Sizes full() { return {1'000, 100'000, 10'000, 1'000'000, 20'000, 5}; }
-    static constexpr Sizes quick() { return {20, 1'000, 50, 5'000, 500, 1}; }
+    std::uint64_t batches;     // of changes, a round
+    std::uint64_t stormFiles;  // each is made, written, renamed and removed
+    std::uint64_t delays;      // changes that are waited for
+    std::uint64_t manyEvents;  // in a long history
+    std::uint64_t fewEvents;   // in a short one
+    std::uint64_t replayed;
+    static constexpr Sizes full() {
+        return {1'000, 100'000, 10'000, 1'000'000,  20'000, 5,
+                10,    50'000,  200,    10'000'000, 10'000, 1'000'000};
+    }
+    static constexpr Sizes quick() {
+        return {20, 1'000, 50, 5'000, 500, 1, 2, 5'000, 20, 1'000'000, 10'000, 100'000};
+    }
 };
 
 // Makes the tree where it is not there already in full. Throws std::system_error.

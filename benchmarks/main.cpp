@@ -3,6 +3,7 @@
 
 #include <exception>
 #include <iostream>
+#include <optional>
 #include <span>
 #include <string>
 #include <vector>
@@ -14,8 +15,9 @@ namespace {
 using namespace marrowdale::benchmarks;  // NOLINT(google-build-using-namespace)
 
 int run(const std::vector<std::string>& arguments) {
-    if (arguments.size() == 3 && arguments[0].starts_with("--memory")) {
-        printMemory(arguments[1], arguments[2], arguments[0] == "--memory-of-listing");
+    if (const auto what = arguments.empty() ? std::nullopt : memoryArgument(arguments[0]);
+        what && arguments.size() == 3) {
+        printMemory(arguments[1], arguments[2], *what);
         return 0;
     }
     const bool quick = arguments.size() == 2 && arguments[1] == "--quick";
@@ -27,11 +29,11 @@ int run(const std::vector<std::string>& arguments) {
                 .sizes = quick ? Sizes::quick() : Sizes::full(),
                 .table = Table(quick ? Table::Targets::leftOut : Table::Targets::shown)};
     const std::vector<std::pair<const char*, void (*)(Suite&)>> parts{
-        {"listings", compareListings},
-        {"paging", comparePaging},
-        {"look-ups", compareLookUps},
-        {"reconcile", compareReconcile},
-        {"memory", compareMemory}};
+        {"listings", compareListings}, {"paging", comparePaging},
+        {"look-ups", compareLookUps},  {"reconcile", compareReconcile},
+        {"memory", compareMemory},     {"recording", compareRecording},
+        {"replays", compareReplays},   {"the store's size", compareStoreSize},
+        {"watchman", compareWatchman}};
     for (const auto& [name, compare] : parts) {
         std::cerr << "measuring " << name << '\n';
         compare(suite);
