@@ -1,4 +1,8 @@
+#include <memory>
+#include <optional>
 #include <stdexcept>
+#include <string>
+#include <utility>
 
 #include <fmt/format.h>
 
@@ -11,10 +15,10 @@ namespace {
 // Streams and bare cursors over one store.
 class Replays {
   public:
-    Replays(const std::string& folder, std::uint64_t events) : root_(folder) {
+    Replays(std::string folder, std::uint64_t events) : root_(std::move(folder)) {
         makeHistory(root_, root_ + ".state", events);
         store_ = openLiveStore(root_, root_ + ".state");
-        last_ = recorded(*store_);
+        last_ = recorded(*store_);  // NOLINT(*-prefer-member-initializer): needs the store
         events_ = std::make_unique<native::LinuxFileEvents>(*store_);
     }
     ~Replays() {
