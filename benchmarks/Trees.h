@@ -30,7 +30,7 @@ struct Sizes {
     std::uint64_t fewEvents;   // in a short one
     std::uint64_t replayed;
     static constexpr Sizes full() {
-        return {1'000, 100'000, 10'000, 1'000'000,  20'000, 5,
+        return {1'000, 100'000, 10'000, 1'000'000,  20'000, 3,
                 10,    50'000,  200,    10'000'000, 10'000, 1'000'000};
     }
     static constexpr Sizes quick() {
