@@ -121,6 +121,20 @@ void Picture::forget(const std::string& identifier) {
     }
 }
 
+void Picture::forgetHidden(const std::string& identifier, const Item& item) {
+    for (auto& [known, names] : items_) {
+        if (known == identifier || !known.starts_with("did=")) {
+            continue;
+        }
+        const DocumentID document{static_cast<std::uint32_t>(std::stoul(known.substr(4)))};
+        std::erase_if(names, [&](const Item& name) {
+            return name.path == item.path && name.fileID == item.fileID &&
+                   world_->store->resolveDocumentID(document, world_->store->device());
+        });
+    }
+    std::erase_if(items_, [](const auto& known) { return known.second.empty(); });
+}
+
 void Picture::forgetBelow(const std::string& folder) {
     for (auto& [identifier, names] : items_) {
         std::erase_if(names, [&](const Item& name) { return isBelow(name.path, folder); });
@@ -153,6 +167,7 @@ void Picture::fsEventReaderDidChangeItem(const std::shared_ptr<LocalItem>& item,
         }
         const bool rescans = now.isFolder && (moved || (event.flags & FileEventFlag::renamed) != 0);
         const std::string path = now.path;
+        forgetHidden(identifier, now);
         remember(identifier, std::move(now));
         if (rescans) {
             forgetBelow(path);

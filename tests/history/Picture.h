@@ -60,6 +60,9 @@ class Picture : public FSEventReaderDelegate {
     [[nodiscard]] Found walk(const std::string& folder) const;
     void remember(const std::string& identifier, Item item);
     void forget(const std::string& identifier);
+    // A document that stood at the item's place, whose file's number the item was given, and that
+    // went out of sight: to nobody's knowledge but the store's.
+    void forgetHidden(const std::string& identifier, const Item& item);
     // All names below the folder.
     void forgetBelow(const std::string& folder);
     void note(const std::string& line, const std::string& identifier);

@@ -210,6 +210,31 @@ TEST_P(StoreEventsTest, EachNameOfAFileIsAnItem) {
     EXPECT_THAT(newsOnce(), ElementsAre("gone b (did=" + std::to_string(raw(document)) + ")"));
 }
 
+TEST_P(StoreEventsTest, ANameThatGoesOutOfSightLeavesTheOthers) {
+    write("a");
+    makeFolder(path("folder"));
+    link("a", "folder/b");
+    begin();
+    const auto document = documentOf("a");
+    (void)news();
+    rename("folder", "folder.bundle");
+    EXPECT_THAT(newsOnce(), ElementsAre("gone+renamed folder/", "gone folder/b",
+                                        "renamed folder.bundle", "changed a"));
+    EXPECT_EQ(documentOf("a"), document);
+}
+
+TEST_P(StoreEventsTest, ANameThatIsMovedOutWithItsFolderLeavesTheOthers) {
+    write("a");
+    makeFolder(path("folder"));
+    link("a", "folder/b");
+    begin();
+    const auto document = documentOf("a");
+    (void)news();
+    std::filesystem::rename(path("folder"), root() + "-outside");
+    EXPECT_THAT(newsOnce(), UnorderedElementsAre("gone folder/", "gone folder/b", "changed a"));
+    EXPECT_EQ(documentOf("a"), document);
+}
+
 TEST_P(StoreEventsTest, AWriteThroughANameOutsideTheTree) {
     write("a");
     const std::string outside = root() + "-outside";

@@ -140,6 +140,26 @@ void TreeChanges::putGone(RowNumber number, const std::string& path, std::uint32
                .path = path});
 }
 
+bool TreeChanges::hasServedName(std::uint32_t document) const {
+    return std::ranges::any_of(index_.rowsOfDocument(document), [&](RowNumber number) {
+        return !index_.row(number).has(Row::limbo) && placeOf(number).package == noRow;
+    });
+}
+
+void TreeChanges::noteOtherNames(RowNumber number) {
+    const Row& row = index_.row(number);
+    if (!row.has(Row::severalLinks)) {
+        return;
+    }
+    for (const RowNumber other : index_.rowsOfFile(row.fileID)) {
+        const Row& otherRow = index_.row(other);
+        if (other != number && otherRow.birth == row.birth &&
+            otherRow.fingerprint == row.fingerprint) {
+            otherNames_.push_back(other);
+        }
+    }
+}
+
 // `forgets`: the rows are about to be freed, so their documents are gone with them.
 void TreeChanges::putBelow(RowNumber folder, const std::string& path, Side side, bool forgets) {
     std::vector<std::pair<RowNumber, std::string>> left{{folder, path}};
@@ -150,9 +170,12 @@ void TreeChanges::putBelow(RowNumber folder, const std::string& path, Side side,
              below = index_.row(below).next) {
             std::string belowPath = joined(abovePath, index_.name(below));
             if (side == Side::gone) {
-                const std::uint32_t document =
-                    forgets ? takeDocument(below) : index_.row(below).document;
+                std::uint32_t document = forgets ? takeDocument(below) : index_.row(below).document;
+                if (!forgets && document != 0 && hasServedName(document)) {
+                    document = 0;
+                }
                 putGone(below, belowPath, kindFlags(below), document);
+                noteOtherNames(below);
             } else {
                 rest_.add({.flags = FileEventFlag::appeared | kindFlags(below),
                            .fileID = FileID{index_.row(below).fileID},
@@ -241,6 +264,7 @@ void TreeChanges::flush(EventBatch& batch) {
     touched_ = std::move(waiting);
     flushGoneDocuments();
     flushPackages();
+    flushOtherNames();
     const auto add = [&batch](const StoredEvent& event) { batch.add(event); };
     gone_.forEach(add);
     rest_.forEach(add);
@@ -312,6 +336,24 @@ void TreeChanges::flushGoneDocuments() {
         }
     }
     goneDocuments_.clear();
+}
+
+void TreeChanges::flushOtherNames() {
+    std::ranges::sort(otherNames_);
+    const auto repeated = std::ranges::unique(otherNames_);
+    otherNames_.erase(repeated.begin(), repeated.end());
+    for (const RowNumber number : otherNames_) {
+        if (index_.row(number).isFree() || index_.row(number).has(Row::limbo)) {
+            continue;
+        }
+        const Place place = placeOf(number);
+        if (place.package == noRow) {
+            rest_.add({.flags = FileEventFlag::changed | kindFlags(number),
+                       .fileID = FileID{index_.row(number).fileID},
+                       .path = place.path});
+        }
+    }
+    otherNames_.clear();
 }
 
 void TreeChanges::flushPackages() {

@@ -100,6 +100,11 @@ class TreeChanges {
     [[nodiscard]] std::uint32_t takeDocument(RowNumber number);
     void putGone(RowNumber number, const std::string& path, std::uint32_t flags,
                  std::uint32_t document);
+    // Whether a name of the document is served, beside those that lie in packages.
+    [[nodiscard]] bool hasServedName(std::uint32_t document) const;
+    // A name of that file went without a change of the file itself: whoever goes by the file's
+    // number is to know that it has others.
+    void noteOtherNames(RowNumber number);
     // Events for what lies below a folder that stands, or stood, at `path`.
     void putBelow(RowNumber folder, const std::string& path, Side side, bool forgets);
     void noteRemovedFolders(RowNumber number);
@@ -107,6 +112,7 @@ class TreeChanges {
     void flushMove(RowNumber number, const Moved& moved, const Place& now);
     void flushGoneDocuments();
     void flushPackages();
+    void flushOtherNames();
 
     Index& index_;
     const PackageTypes& packages_;
@@ -115,6 +121,7 @@ class TreeChanges {
     std::unordered_map<RowNumber, Left> left_;    // in limbo
     std::unordered_map<RowNumber, Moved> moved_;  // placed again
     std::vector<RowNumber> packagesChanged_;
+    std::vector<RowNumber> otherNames_;
     std::vector<GoneDocument> goneDocuments_;
     std::vector<Departure> departures_;
     std::vector<Arrival> arrivals_;
