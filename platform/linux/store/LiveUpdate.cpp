@@ -33,10 +33,12 @@ Expected<LiveUpdate::Left> LiveUpdate::process(HintSet& hints) {
         first = last;
     }
     if (!toList_.empty()) {
-        auto listed = Reconciler(scope_).runOn(std::exchange(toList_, {}));
+        Reconciler reconciler(scope_);
+        auto listed = reconciler.runOn(std::exchange(toList_, {}));
         if (!listed) {
             return Unexpected(listed.error());
         }
+        left_.missedFolders = reconciler.hasMissedFolders();
     }
     return std::move(left_);
 }
@@ -68,13 +70,21 @@ RowNumber LiveUpdate::folderRow(FileID folder) const {
     return noRow;
 }
 
+bool LiveUpdate::isInLimbo(FileID folder) const {
+    return std::ranges::any_of(scope_.index.rowsOfFile(raw(folder)), [&](RowNumber number) {
+        const Row& row = scope_.index.row(number);
+        return row.isFolder() && row.has(Row::limbo);
+    });
+}
+
 std::optional<UniqueFD> LiveUpdate::openFolderOf(FileID folder) {
     std::string path;
     {
         const MutexLock lock(mutex_);
         const RowNumber number = folderRow(folder);
         if (number == noRow) {
-            return std::nullopt;
+            // One in limbo may be found yet, and its hints are needed then.
+            return isInLimbo(folder) ? std::optional<UniqueFD>(UniqueFD()) : std::nullopt;
         }
         if (!scope_.index.path(number, path)) {
             return UniqueFD();

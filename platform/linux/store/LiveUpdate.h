@@ -22,6 +22,8 @@ class LiveUpdate {
         std::vector<HintSet::Hint> hints;
         // The root was moved, removed or unmounted.
         bool rootMoved = false;
+        // Folders that are new were moved before they could be listed.
+        bool missedFolders = false;
     };
 
     explicit LiveUpdate(const TreeScope& scope);
@@ -52,6 +54,7 @@ class LiveUpdate {
     void merge(const Found& found) MARROWDALE_EXCLUDES(mutex_);
     void tellArrival(const HintSet::Hint& hint, const Found& found) MARROWDALE_REQUIRES(mutex_);
     [[nodiscard]] RowNumber folderRow(FileID folder) const MARROWDALE_REQUIRES(mutex_);
+    [[nodiscard]] bool isInLimbo(FileID folder) const MARROWDALE_REQUIRES(mutex_);
 
     const TreeScope& scope_;
     Mutex& mutex_;

@@ -155,6 +155,7 @@ std::optional<Reconciler::Visit> Reconciler::takeFolder() {
             ++busy_;
             return next;
         }
+        missed_ = true;
     }
 }
 
@@ -371,6 +372,7 @@ void Reconciler::finishFolder(const Visit& visit, Outcome outcome) {
     }
     if (outcome == Outcome::vanished) {
         unsettled_ = true;
+        missed_ = true;
         return;
     }
     setUnreadable(visit.folder, outcome == Outcome::unreadable);

@@ -196,20 +196,22 @@ Expected<bool> Store::Core::followHints(const TreeScope& scope) {
     HintSet hints;
     LiveUpdate update(scope);
     std::vector<HintSet::Hint> unreached;
-    bool hasProgressed = false;
+    bool missedFolders = false;
+    bool mayReach = false;
     for (int round = 0; round < mostRounds; ++round) {
         const auto whole = drain(hints);
         if (!whole || !*whole) {
             return whole;
         }
-        // What could not be reached is worth another try when something moved.
-        if (hints.empty() && (unreached.empty() || !hasProgressed)) {
+        // Worth another try only when something moved.
+        if (hints.empty() && !mayReach) {
             break;
         }
+        const std::size_t unreachedBefore = unreached.size();
+        const bool hasNews = !hints.empty();
         for (const HintSet::Hint& hint : std::exchange(unreached, {})) {
             hints.add(hint);
         }
-        const std::size_t count = hints.size();
         auto left = update.process(hints);
         if (!left) {
             return Unexpected(left.error());
@@ -220,13 +222,14 @@ Expected<bool> Store::Core::followHints(const TreeScope& scope) {
             }
         }
         unreached = std::move(left->hints);
-        hasProgressed = unreached.size() < count;
+        missedFolders = missedFolders || left->missedFolders;
+        mayReach = !unreached.empty() && (hasNews || unreached.size() < unreachedBefore);
         const MutexLock lock(mutex_);
         if (unreached.empty() && !index_.hasLimbo()) {
             break;
         }
     }
-    return unreached.empty() || watches_->isComplete();
+    return !missedFolders && (unreached.empty() || watches_->isComplete());
 }
 
 Expected<void> Store::Core::listUnwatched(const TreeScope& scope) {
