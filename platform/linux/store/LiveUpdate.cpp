@@ -38,7 +38,7 @@ Expected<LiveUpdate::Left> LiveUpdate::process(HintSet& hints) {
         if (!listed) {
             return Unexpected(listed.error());
         }
-        left_.missedFolders = reconciler.hasMissedFolders();
+        left_.missedFolders = reconciler.missedFolders();
     }
     return std::move(left_);
 }

@@ -23,7 +23,7 @@ class LiveUpdate {
         // The root was moved, removed or unmounted.
         bool rootMoved = false;
         // Folders that are new were moved before they could be listed.
-        bool missedFolders = false;
+        std::vector<RowNumber> missedFolders;
     };
 
     explicit LiveUpdate(const TreeScope& scope);

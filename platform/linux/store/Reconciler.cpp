@@ -155,7 +155,7 @@ std::optional<Reconciler::Visit> Reconciler::takeFolder() {
             ++busy_;
             return next;
         }
-        missed_ = true;
+        missed_.push_back(next.folder);
     }
 }
 
@@ -372,7 +372,7 @@ void Reconciler::finishFolder(const Visit& visit, Outcome outcome) {
     }
     if (outcome == Outcome::vanished) {
         unsettled_ = true;
-        missed_ = true;
+        missed_.push_back(visit.folder);
         return;
     }
     setUnreadable(visit.folder, outcome == Outcome::unreadable);

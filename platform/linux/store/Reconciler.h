@@ -52,8 +52,8 @@ class Reconciler {
     // After a run: whether what is in limbo is gone for sure; else something kept moving under the
     // walk.
     [[nodiscard]] bool isSettled() const { return settled_; }
-    // After a run: whether folders were not where they had been met, so that they were not listed.
-    [[nodiscard]] bool hasMissedFolders() const { return missed_; }
+    // After a run: folders that were not where they had been met, so that they were not listed.
+    [[nodiscard]] const std::vector<RowNumber>& missedFolders() const { return missed_; }
 
   private:
     struct Found {
@@ -125,7 +125,7 @@ class Reconciler {
     const DeviceID device_;
     const std::vector<FileID> skipped_;
     bool settled_ = false;
-    bool missed_ = false;  // written under the mutex; read when the walk is over
+    std::vector<RowNumber> missed_;  // written under the mutex; read when the walk is over
     std::condition_variable_any changed_;
     std::vector<RowNumber> stack_ MARROWDALE_GUARDED_BY(mutex_);
     std::vector<RowNumber> later_ MARROWDALE_GUARDED_BY(mutex_);  // are being listed by another

@@ -116,6 +116,8 @@ class Store::Core {
     // False when everything must be looked at.
     [[nodiscard]] Expected<bool> runHints(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<bool> followHints(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
+    // Whether one of these folders is in the tree.
+    [[nodiscard]] bool anyStands(std::span<const RowNumber> folders) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<bool> drain(HintSet& hints) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<void> listUnwatched(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<void> checkRoot() MARROWDALE_EXCLUDES(mutex_);

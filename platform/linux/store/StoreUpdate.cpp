@@ -196,7 +196,7 @@ Expected<bool> Store::Core::followHints(const TreeScope& scope) {
     HintSet hints;
     LiveUpdate update(scope);
     std::vector<HintSet::Hint> unreached;
-    bool missedFolders = false;
+    std::vector<RowNumber> missed;
     bool mayReach = false;
     for (int round = 0; round < mostRounds; ++round) {
         const auto whole = drain(hints);
@@ -222,14 +222,26 @@ Expected<bool> Store::Core::followHints(const TreeScope& scope) {
             }
         }
         unreached = std::move(left->hints);
-        missedFolders = missedFolders || left->missedFolders;
+        missed.insert(missed.end(), left->missedFolders.begin(), left->missedFolders.end());
         mayReach = !unreached.empty() && (hasNews || unreached.size() < unreachedBefore);
         const MutexLock lock(mutex_);
         if (unreached.empty() && !index_.hasLimbo()) {
             break;
         }
     }
-    return !missedFolders && (unreached.empty() || watches_->isComplete());
+    return !anyStands(missed) && (unreached.empty() || watches_->isComplete());
+}
+
+bool Store::Core::anyStands(std::span<const RowNumber> folders) {
+    const MutexLock lock(mutex_);
+    for (const RowNumber number : folders) {
+        std::string path;
+        const Row& row = index_.row(number);
+        if (!row.isFree() && row.isFolder() && index_.path(number, path)) {
+            return true;
+        }
+    }
+    return false;
 }
 
 Expected<void> Store::Core::listUnwatched(const TreeScope& scope) {
@@ -273,7 +285,7 @@ Expected<void> Store::Core::runFull(const TreeScope& scope) {
     if (!whole) {
         return Unexpected(whole.error());
     }
-    mustLookAtAll_ = !*whole;
+    mustLookAtAll_ = !*whole || (watcher_ && anyStands(reconciler.missedFolders()));
     if (*whole && reconciler.isSettled()) {
         settle(SafeSaves::Knowledge::result);
     }
