@@ -18,6 +18,8 @@ namespace {
 
 // Batches of hints that one pass works through before it lets others have their turn.
 constexpr int mostRounds = 64;
+// Walks that one pass makes when so much happens under them that one does not see it all.
+constexpr int mostWalks = 3;
 // Rows that are looked at once more, so that no doubt is left for the next start.
 constexpr std::size_t mostUnsure = 1000;
 
@@ -134,8 +136,15 @@ Expected<void> Store::Core::look(Pass pass) {
             return {};
         }
     }
-    mustLookAtAll_ = false;
-    return runFull(tree);
+    // Whoever asked for this pass counts on all of it; a tree that never rests is left to the next.
+    mustLookAtAll_ = true;
+    for (int walk = 0; walk < mostWalks && mustLookAtAll_; ++walk) {
+        mustLookAtAll_ = false;
+        if (auto done = runFull(tree); !done) {
+            return done;
+        }
+    }
+    return {};
 }
 
 // Another folder at the root's path, or none, is not to be taken for a tree that was emptied.
