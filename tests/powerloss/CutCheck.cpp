@@ -143,10 +143,11 @@ void CutCheck::checkDocumentsOf(const std::string& folder) {
         complain("documents are refused: " + done.error().description());
         return;
     }
+    const std::string below = folder.empty() ? "" : folder + "/";
     for (const auto& request : asked.requests) {
         const std::string name(request.name);
         if (request.document != DocumentID{}) {
-            checkOwner(request.document, folder.empty() ? name : folder + "/" + name,
+            checkOwner(request.document, below + name,
                        {request.status.fileID, request.status.birth});
         }
     }

@@ -6,8 +6,10 @@
 #include <cerrno>
 #include <cstddef>
 #include <fuse.h>
+#include <sched.h>
 #include <span>
 #include <string_view>
+#include <sys/mount.h>
 #include <sys/stat.h>
 #include <system_error>
 #include <unistd.h>
@@ -117,6 +119,11 @@ int serveImage(const std::string& folder, MemoryFile& contents, WriteLog& log, i
     const fuse_operations calls = operations();
     fuse* const system = ::fuse_new(&options, &calls, sizeof calls, &here);
     if (system == nullptr || ::fuse_mount(system, folder.c_str()) != 0) {
+        return 1;
+    }
+    // The mount is the caller's alone: when all is killed, its namespace goes while this process
+    // still answers, and not with this process, which would then wait for itself.
+    if (::unshare(CLONE_NEWNS) != 0 || ::umount2(folder.c_str(), MNT_DETACH) != 0) {
         return 1;
     }
     int result = 1;
