@@ -37,11 +37,6 @@ TEST_P(PictureTest, FollowsARandomWriter) {
 }
 
 TEST_P(PictureTest, HoldsOverRestartsAtRandomMoments) {
-    if (!isLive()) {
-        GTEST_SKIP()
-            << "a walk without a watcher may tell that a file is gone after its number was "
-               "told of as another's";
-    }
     const std::uint32_t seed = newSeed();
     makeFolder(root());
     begin();

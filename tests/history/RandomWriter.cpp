@@ -6,11 +6,17 @@
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <unistd.h>
+#include <utility>
 
 namespace marrowdale::tests {
 
 // A step that fails, because what it needs is not there, is part of the game: nothing here looks at
 // what calls answer.
+
+RandomWriter::RandomWriter(std::string root, std::uint32_t seed)
+    : root_(std::move(root)), linked_(root_ + "-linked"), random_(seed) {
+    write(linked_);
+}
 
 std::string RandomWriter::folder() {
     static constexpr std::array names{"A", "B", "C", "D", ".hid", "P.bundle"};
@@ -150,8 +156,9 @@ void RandomWriter::step() {
             (void)::lsetxattr(file().c_str(), "user.tag", "red", 3, 0);
             break;
         case 20:
-            // To what is always there: an item's own events don't tell of what a link points to.
-            (void)::symlink("/dev/null", file().c_str());
+            // To what is always there, and nobody else's: modes are set through links, and an
+            // item's own events don't tell of what a link points to.
+            (void)::symlink(linked_.c_str(), file().c_str());
             break;
         default:
             save();

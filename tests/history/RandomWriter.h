@@ -11,7 +11,8 @@ namespace marrowdale::tests {
 // are few, so that they meet; what a step needs and does not find, it leaves undone. One thread.
 class RandomWriter {
   public:
-    RandomWriter(std::string root, std::uint32_t seed) : root_(std::move(root)), random_(seed) {}
+    // Makes a file beside the root too, for links to lead to.
+    RandomWriter(std::string root, std::uint32_t seed);
 
     void step();
     void steps(int count) {
@@ -32,6 +33,7 @@ class RandomWriter {
     void save();
 
     const std::string root_;
+    const std::string linked_;
     std::mt19937 random_;
 };
 

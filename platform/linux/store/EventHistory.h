@@ -40,7 +40,8 @@ class EventHistory {
     virtual ~EventHistory() = default;
 
     // The identifier of the newest event, once everything that anybody did before the call is
-    // recorded and committed.
+    // recorded and committed. A store that does not listen tells of what it saw at its last look:
+    // when it was opened, or when something was asked for that it did not know.
     [[nodiscard]] virtual Expected<EventID> barrier() = 0;
     // The newest committed event; no look at the disk.
     [[nodiscard]] virtual EventID lastEventID() = 0;

@@ -57,8 +57,8 @@ class Reconciler {
 
   private:
     struct Found {
-        std::size_t nameStart;
-        std::size_t nameSize;
+        std::size_t nameStart = 0;
+        std::size_t nameSize = 0;
         EntryStatus status;
     };
     struct Batch {
@@ -81,8 +81,8 @@ class Reconciler {
     };
     // When a folder was listed, to see whether it changed since.
     struct Stamp {
-        RowNumber folder;
-        bool unsure;
+        RowNumber folder = noRow;
+        bool unsure = false;
         Date modified;
     };
     enum class Outcome : std::uint8_t { listed, unreadable, vanished };

@@ -97,12 +97,9 @@ void SafeSaves::add(TreeChanges::Departure departure, Clock::time_point now,
     vacancy.isFolder = departure.isFolder;
     vacancy.since = now;
     vacancy.wasRenamed = renamedAway_.contains({vacancy.folder, vacancy.name});
-    const Row& row = index_.row(departure.row);
-    if (!row.isFree() && row.fileID == raw(departure.file)) {
-        vacancy.fingerprint = row.fingerprint;
-        vacancy.birth = row.birth;
-        vacancy.attributes = index_.attributes(departure.row);
-    }
+    vacancy.birth = departure.birth;
+    vacancy.fingerprint = departure.fingerprint;
+    vacancy.attributes = std::move(departure.attributes);
     const Number number = next_++;
     byName_.emplace(Name{vacancy.folder, vacancy.name}, number);
     byDocument_.emplace(vacancy.document, number);

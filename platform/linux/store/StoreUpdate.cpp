@@ -6,6 +6,7 @@
 #include <ctime>
 #include <fcntl.h>
 #include <iterator>
+#include <new>
 #include <utility>
 
 #include "platform/linux/store/DiskCheck.h"
@@ -98,7 +99,13 @@ Expected<void> Store::Core::runOnce(Pass pass) {
         ++passesStarted_;
         fullPassesStarted_ += pass == Pass::full ? 1 : 0;
     }
-    auto done = run(pass);
+    // However the pass ends, those who wait go on.
+    Expected<void> done = Unexpected(errorWithPOSIXCode(ENOMEM, "look at", rootPath_));
+    try {
+        done = run(pass);
+    } catch (const std::bad_alloc&) {
+        // As it stands.
+    }
     const MutexLock lock(mutex_);
     lastRunError_ = done ? std::optional<Error>() : done.error();
     updating_ = false;
@@ -208,7 +215,7 @@ Expected<bool> Store::Core::followHints(const TreeScope& scope) {
     std::vector<RowNumber> missed;
     bool mayReach = false;
     for (int round = 0; round < mostRounds; ++round) {
-        const auto whole = drain(hints);
+        auto whole = drain(hints);
         if (!whole || !*whole) {
             return whole;
         }

@@ -1,6 +1,7 @@
 #include "platform/linux/store/TreeChanges.h"
 
 #include <algorithm>
+#include <ranges>
 #include <utility>
 
 #include "platform/services/FileEventService.h"
@@ -59,8 +60,8 @@ TreeChanges::Place TreeChanges::placeOf(RowNumber number) const {
         }
         parts.push_back(index_.name(up));
     }
-    for (auto part = parts.rbegin(); part != parts.rend(); ++part) {
-        place.path = joined(place.path, *part);
+    for (const std::string_view part : std::views::reverse(parts)) {
+        place.path = joined(place.path, part);
     }
     return place;
 }
@@ -93,8 +94,9 @@ void TreeChanges::leave(RowNumber number) {
     const Row& row = index_.row(number);
     const FileID folder{index_.row(row.parent).fileID};
     if (row.document != 0) {
-        departures_.push_back({number, row.document, FileID{row.fileID}, row.isFolder(), folder,
-                               std::string(index_.name(number))});
+        departures_.push_back({row.document, FileID{row.fileID}, row.birth, row.fingerprint,
+                               row.isFolder(), folder, std::string(index_.name(number)),
+                               index_.attributes(number)});
     }
     left_.insert_or_assign(number, Left{placeOf(number), folder, isPackage(number)});
     index_.putInLimbo(number);

@@ -47,12 +47,14 @@ class TreeChanges {
     // A place that a document left, and a place that a moved row came to, since they were last
     // taken.
     struct Departure {
-        RowNumber row = noRow;
         std::uint32_t document = 0;
         FileID file{};
+        std::int64_t birth = 0;
+        std::uint32_t fingerprint = 0;
         bool isFolder = false;  // a package
         FileID folder{};
         std::string name;
+        CarriedAttributes attributes;
     };
     struct Arrival {
         FileID folder{};
