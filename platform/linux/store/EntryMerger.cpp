@@ -146,18 +146,8 @@ void EntryMerger::refreshOtherNames(RowNumber number, const EntryLook& look) {
     }
 }
 
-// A file whose inode number was given away is gone for sure, and that is told before the new one.
-void EntryMerger::removeEarlierOwners(const EntryLook& look) {
-    for (const RowNumber number : index_.rowsOfFile(raw(look.status.fileID))) {
-        if (index_.row(number).has(Row::limbo) && !isSameFile(index_.row(number), look, false)) {
-            changes_.remove(number);
-        }
-    }
-}
-
 RowNumber EntryMerger::addName(RowNumber folder, std::string_view name, const EntryLook& look,
                                const Kin& kin) {
-    removeEarlierOwners(look);
     Row values = valuesOf(look);
     values.setAge(kin.nextAge);
     const RowNumber added = index_.add(folder, name, values);

@@ -69,7 +69,6 @@ class EntryMerger {
     [[nodiscard]] Kin findKin(const EntryLook& look, RowNumber except) const;
     void refresh(RowNumber number, const EntryLook& look);
     void refreshOtherNames(RowNumber number, const EntryLook& look);
-    void removeEarlierOwners(const EntryLook& look);
     [[nodiscard]] RowNumber addName(RowNumber folder, std::string_view name, const EntryLook& look,
                                     const Kin& kin);
 
