@@ -8,6 +8,7 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
+#include <future>
 #include <sched.h>
 #include <set>
 #include <sys/stat.h>
@@ -125,10 +126,11 @@ TEST_P(RecorderTest, AFileInADeepChainThatWasJustMadeIsReadAtOnce) {
 TEST_P(RecorderTest, AFullQueueLosesNothing) {
     begin();
     std::atomic<bool> isHeld = false;
-    std::atomic<bool> mayGo = false;
-    const auto listener = store().addListener([&](native::EventHistory::News) {
+    std::promise<void> release;
+    const auto released = release.get_future().share();
+    const auto listener = store().addListener([&isHeld, released](native::EventHistory::News) {
         if (!isHeld.exchange(true)) {
-            (void)waitUntil([&] { return mayGo.load(); });
+            released.wait();  // a promise that goes is kept too
         }
     });
     writeFile(path("first"), "x");
@@ -147,7 +149,7 @@ TEST_P(RecorderTest, AFullQueueLosesNothing) {
             ASSERT_EQ(::rename(file.c_str(), path("storm/" + nameOf(i)).c_str()), 0);
         }
     }
-    mayGo = true;
+    release.set_value();
     ASSERT_TRUE(store().barrier());
     store().removeListener(listener);
     EXPECT_TRUE(store().report().recorder.lastOverflow);
