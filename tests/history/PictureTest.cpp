@@ -122,7 +122,9 @@ class KilledRecorderTest : public HistoryTest {
     int tell_ = -1;
 };
 
-TEST_P(KilledRecorderTest, TheNextStartHasEverything) {
+class KilledAtRandomTest : public KilledRecorderTest {};
+
+TEST_P(KilledAtRandomTest, TheNextStartHasEverything) {
     const std::uint32_t seed = newSeed();
     makeFolder(root());
     begin();
@@ -171,6 +173,12 @@ TEST_P(KilledRecorderTest, AWriteInTheTickOfTheLastLookIsNotLost) {
 INSTANTIATE_TEST_SUITE_P(OnEach, KilledRecorderTest,
                          testing::Combine(testing::ValuesIn(testFileSystems()),
                                           testing::Values(Following::fanotify, Following::inotify)),
+                         historyParameterName);
+GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(KilledAtRandomTest);
+INSTANTIATE_TEST_SUITE_P(ByHand, KilledAtRandomTest,
+                         testing::Combine(testing::ValuesIn(testFileSystems()),
+                                          testing::ValuesIn(byHand({Following::fanotify,
+                                                                    Following::inotify}))),
                          historyParameterName);
 
 }  // namespace
