@@ -25,8 +25,8 @@ namespace marrowdale::tests {
 // How many times as long as usual the tests take.
 inline int stress() {
     const char* value = std::getenv("MARROWDALE_STRESS");  // NOLINT(concurrency-mt-unsafe)
-    const int times = value != nullptr ? std::atoi(value) : 1;
-    return times > 0 ? times : 1;
+    const long times = value != nullptr ? std::strtol(value, nullptr, 10) : 1;
+    return times > 0 && times <= 1000 ? static_cast<int>(times) : 1;
 }
 
 // A new one each time, or that of MARROWDALE_SEED; printed, so that a failure can be had again.
@@ -49,7 +49,7 @@ enum class Following : std::uint8_t {
 // What runs only where MARROWDALE_STRESS is set: a writer and a recorder side by side are not the
 // same twice. Known: in about one of ten such runs the picture misses an entry or two, with
 // inotify, after a kill, and where folders are exchanged at full speed.
-inline std::vector<Following> byHand(std::vector<Following> ways) {
+inline std::vector<Following> byHand(const std::vector<Following>& ways) {
     return std::getenv("MARROWDALE_STRESS") != nullptr ? ways : std::vector<Following>();
 }
 
@@ -63,9 +63,13 @@ inline std::string historyParameterName(const testing::TestParamInfo<HistoryPara
 
 // A world that is opened and closed, and a client who follows it.
 class HistoryTest : public testing::TestWithParam<HistoryParameter> {
-  protected:
+  public:
+    HistoryTest() = default;
     ~HistoryTest() override { close(); }
+    HistoryTest(const HistoryTest&) = delete;
+    HistoryTest& operator=(const HistoryTest&) = delete;
 
+  protected:
     [[nodiscard]] Following following() const { return std::get<1>(GetParam()); }
     [[nodiscard]] bool isLive() const { return following() != Following::restart; }
     [[nodiscard]] virtual native::StoreOptions options() const {
