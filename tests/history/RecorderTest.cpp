@@ -157,7 +157,9 @@ TEST_P(RecorderTest, AFullQueueLosesNothing) {
     expectWhole();
 }
 
-TEST_P(RecorderTest, FoldersThatAreRenamedWhileTheirContentsChange) {
+class StormTest : public RecorderTest {};
+
+TEST_P(StormTest, FoldersThatAreRenamedWhileTheirContentsChange) {
     begin();
     makeFolder(path("A/deep"));
     makeFolder(path("other"));
@@ -185,9 +187,7 @@ TEST_P(RecorderTest, FoldersThatAreRenamedWhileTheirContentsChange) {
     }
 }
 
-class ExchangeStormTest : public RecorderTest {};
-
-TEST_P(ExchangeStormTest, LoseNoFolder) {
+TEST_P(StormTest, ExchangesLoseNoFolder) {
     begin();
     for (const char* folder : {"A", "B", "A/in", "B/in"}) {
         makeFolder(path(folder));
@@ -374,8 +374,8 @@ INSTANTIATE_TEST_SUITE_P(OnEach, RecorderTest,
                                           testing::Values(Following::fanotify, Following::inotify)),
                          historyParameterName);
 
-GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(ExchangeStormTest);
-INSTANTIATE_TEST_SUITE_P(ByHand, ExchangeStormTest,
+GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(StormTest);
+INSTANTIATE_TEST_SUITE_P(ByHand, StormTest,
                          testing::Combine(testing::ValuesIn(testFileSystems()),
                                           testing::ValuesIn(byHand({Following::fanotify,
                                                                     Following::inotify}))),
