@@ -94,7 +94,7 @@ Failure Failure::provider(const Error& error) {
 Failure Failure::nothingAt(std::string_view path) {
     Failure failure = provider(errorForNonExistentItem(path));
     failure.message = "nothing is served at " + std::string(path);
-    failure.details = {{"path", std::string(path)}};
+    failure.details = {{"itemIdentifier", std::string(path)}, {"path", std::string(path)}};
     return failure;
 }
 

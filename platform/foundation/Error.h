@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <expected>
+#include <memory>
 #include <string>
 #include <string_view>
 
@@ -22,6 +23,15 @@ enum class FileErrorCode : int {
     fileExists = 516,
 };
 
+// What an error of one kind carries beyond its texts; each kind derives a type of its own (a file
+// error 516 the URL in the way, the framework's collision the item there). Not changed once made.
+struct ErrorUserInfo {
+    ErrorUserInfo() = default;
+    ErrorUserInfo(const ErrorUserInfo&) = delete;
+    ErrorUserInfo& operator=(const ErrorUserInfo&) = delete;
+    virtual ~ErrorUserInfo() = default;
+};
+
 // An error as a value. `operation` and `subject` say what was being done to which path or
 // identifier; both may be empty ("no user info"). Plain data, copyable, usable from any thread.
 struct Error {
@@ -29,6 +39,7 @@ struct Error {
     int code = 0;
     std::string operation;  // "open", "read attributes of", …
     std::string subject;    // path (bytes as the system has them) or identifier
+    std::shared_ptr<const ErrorUserInfo> userInfo = nullptr;  // null for most
 
     // The domain's name as it appears in machine output.
     [[nodiscard]] std::string_view domainName() const;

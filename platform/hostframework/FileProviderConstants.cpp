@@ -26,4 +26,18 @@ Error errorSyncAnchorExpired() {
             {}};
 }
 
+Error collisionErrorForItem(std::shared_ptr<const FileProviderItem> item) {
+    Error error{ErrorDomain::fileProvider,
+                static_cast<int>(FileProviderErrorCode::filenameCollision),
+                {},
+                item->filename};
+    error.userInfo = std::make_shared<CollidingItemInfo>(std::move(item));
+    return error;
+}
+
+Error errorInvalidParameter(std::string_view parameter, std::string_view value) {
+    return {ErrorDomain::fileProvider, static_cast<int>(FileProviderErrorCode::invalidParameter),
+            std::string(parameter), std::string(value)};
+}
+
 }  // namespace marrowdale

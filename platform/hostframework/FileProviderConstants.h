@@ -1,10 +1,12 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 #include <string_view>
 
 #include "platform/foundation/Data.h"
 #include "platform/foundation/Error.h"
+#include "platform/hostframework/FileProviderItem.h"
 
 namespace marrowdale {
 
@@ -30,8 +32,17 @@ enum class FileProviderErrorCode : int {
     invalidParameter = -1004,  // operation: the parameter; subject: its value
 };
 
+// The item in the way, carried by filenameCollision.
+struct CollidingItemInfo final : ErrorUserInfo {
+    explicit CollidingItemInfo(std::shared_ptr<const FileProviderItem> itemInTheWay)
+        : item(std::move(itemInTheWay)) {}
+    std::shared_ptr<const FileProviderItem> item;
+};
+
 [[nodiscard]] Error errorForNonExistentItem(std::string_view itemIdentifier);
 [[nodiscard]] Error errorSyncAnchorExpired();
+[[nodiscard]] Error collisionErrorForItem(std::shared_ptr<const FileProviderItem> item);
+[[nodiscard]] Error errorInvalidParameter(std::string_view parameter, std::string_view value);
 
 // What an item allows, as bits of FileProviderItem::capabilities.
 enum ItemCapability : std::uint64_t {
