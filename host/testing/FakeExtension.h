@@ -33,11 +33,28 @@ struct FakeAnswer {
     std::optional<Error> error;  // wins over the rest
 };
 
-// Answers one page after the other from a list, and remembers which pages were asked for.
+// What one request for changes is answered with.
+struct FakeChanges {
+    std::vector<std::string> updated;
+    std::vector<std::string> deleted;
+    Data anchor;
+    MoreComing moreComing = MoreComing::no;
+    std::optional<Error> error;  // in place of a finish with the anchor
+};
+
+// Answers one page after the other from a list, and remembers which pages were asked for. Requests
+// for changes are answered on the thread that asks.
 class FakeEnumerator final : public FileProviderEnumerator {
   public:
     struct Record {
         std::vector<Data> pages;
+        std::vector<Data> anchors;  // that changes were asked for
+        std::vector<FakeChanges> changes;
+        std::optional<Data> currentAnchor;
+        // Observers of requests behind the last of `changes`, for a test to answer.
+        std::vector<std::shared_ptr<FileProviderChangeObserver>> waiting;
+        int starts = 0;
+        int stops = 0;
         bool isInvalidated = false;
     };
     FakeEnumerator(std::vector<FakeAnswer> answers, Record& record)
@@ -51,20 +68,52 @@ class FakeEnumerator final : public FileProviderEnumerator {
             observer.finishEnumeratingWithError(*answer.error);
             return;
         }
-        std::vector<FileProviderItemPtr> items;
-        for (const std::string& identifier : answer.identifiers) {
-            items.push_back(std::make_shared<FakeItem>(identifier));
-        }
-        observer.didEnumerateItems(std::move(items));
+        observer.didEnumerateItems(items(answer.identifiers));
         observer.finishEnumeratingUpToPage(answer.nextPage);
+    }
+    void enumerateChangesForObserver(std::shared_ptr<FileProviderChangeObserver> observer,
+                                     const Data& anchor) override {
+        record_.anchors.push_back(anchor);
+        if (record_.anchors.size() > record_.changes.size()) {
+            record_.waiting.push_back(std::move(observer));
+            return;
+        }
+        const FakeChanges changes = record_.changes[record_.anchors.size() - 1];
+        if (!changes.deleted.empty()) {
+            observer->didDeleteItemsWithIdentifiers(changes.deleted);
+        }
+        if (!changes.updated.empty()) {
+            observer->didUpdateItems(items(changes.updated));
+        }
+        if (changes.error) {
+            observer->finishEnumeratingWithError(*changes.error);
+        } else {
+            observer->finishEnumeratingChangesUpToSyncAnchor(changes.anchor, changes.moreComing);
+        }
     }
     void currentSyncAnchorWithCompletionHandler(
         const std::function<void(const std::optional<Data>&)>& completionHandler) override {
-        completionHandler(std::nullopt);
+        completionHandler(record_.currentAnchor);
     }
-    void invalidate() override { record_.isInvalidated = true; }
+    void start() override { ++record_.starts; }
+    void stop() override {
+        ++record_.stops;
+        record_.waiting.clear();
+    }
+    void invalidate() override {
+        record_.isInvalidated = true;
+        record_.waiting.clear();
+    }
 
   private:
+    static std::vector<FileProviderItemPtr> items(const std::vector<std::string>& identifiers) {
+        std::vector<FileProviderItemPtr> made;
+        for (const std::string& identifier : identifiers) {
+            made.push_back(std::make_shared<FakeItem>(identifier));
+        }
+        return made;
+    }
+
     std::vector<FakeAnswer> answers_;
     Record& record_;
 };

@@ -89,6 +89,15 @@ void LocalFileEnumerator::enumerateItemsForObserver(FileProviderEnumerationObser
     gatherPhase(observer, token);
 }
 
+void LocalFileEnumerator::enumerateChangesForObserver(
+    std::shared_ptr<FileProviderChangeObserver> observer, const Data& /*anchor*/) noexcept {
+    observer->finishEnumeratingWithError(errorSyncAnchorExpired());
+}
+
+void LocalFileEnumerator::start() noexcept {}
+
+void LocalFileEnumerator::stop() noexcept {}
+
 void LocalFileEnumerator::currentSyncAnchorWithCompletionHandler(
     const std::function<void(const std::optional<Data>&)>& completionHandler) noexcept {
     completionHandler(std::nullopt);

@@ -38,9 +38,14 @@ class LocalFileEnumerator : public FileProviderEnumerator {
     // is left out. The last page may be empty.
     void enumerateItemsForObserver(FileProviderEnumerationObserver& observer,
                                    const Data& page) noexcept override;
+    // Refuses every anchor as expired: no anchor is handed out.
+    void enumerateChangesForObserver(std::shared_ptr<FileProviderChangeObserver> observer,
+                                     const Data& anchor) noexcept override;
     // Answers no anchor: live changes are not followed.
     void currentSyncAnchorWithCompletionHandler(
         const std::function<void(const std::optional<Data>&)>& completionHandler) noexcept override;
+    void start() noexcept override;
+    void stop() noexcept override;
     void invalidate() noexcept override;
 
     [[nodiscard]] const std::string& container() const { return container_; }
