@@ -42,6 +42,8 @@ LAYERS = {
     "platform/linux/applications": ["platform/foundation", "platform/services"] + FILES,
     # The module is reached through its entry point, so the host knows the extension's interfaces
     # and never its classes. The codes of its errors are part of what it answers.
+    "host/requests": INTERFACES + FILES + ["providers/marrowdale/items/ProviderError.h"],
+    "host/client": INTERFACES + ["host/requests"],
     "host": INTERFACES + LINUX + ["providers/marrowdale/items/ProviderError.h"],
     # The interface between the two halves of platform/linux has a double that the tests of both use.
     "platform/testing": INTERFACES + ["platform/linux/files/DocumentIndex.h",

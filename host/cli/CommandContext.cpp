@@ -6,6 +6,7 @@
 #include "host/daemon/ExtensionModule.h"
 #include "host/daemon/JournalSink.h"
 #include "host/daemon/StandardErrorSink.h"
+#include "platform/hostframework/FileProviderConstants.h"
 
 namespace marrowdale::host {
 
@@ -40,6 +41,12 @@ CommandContext::CommandContext(const Environment& environment, const GlobalOptio
       output_(output),
       isOnTerminal_(!options.json && ::isatty(STDOUT_FILENO) == 1) {}
 
+// Only paths are looked up, so a path is what is missing.
+Failure CommandContext::lookUpFailure(const Error& error) {
+    return error == errorForNonExistentItem({}) ? Failure::nothingAt(error.subject)
+                                                : Failure::provider(error);
+}
+
 ItemTable::Colour CommandContext::colour() const {
     const bool isWanted = isOnTerminal_ && !environment_.variable("NO_COLOR") &&
                           environment_.variable("TERM").value_or("dumb") != "dumb";
@@ -54,10 +61,7 @@ Started<std::string> CommandContext::stateFolder() const {
     return stateFolderFor(options_.places, environment_);
 }
 
-std::expected<World*, Failure> CommandContext::world() {
-    if (world_) {
-        return world_.get();
-    }
+std::expected<WorldOptions, Failure> CommandContext::worldOptions() const {
     auto places = settingsFor(options_.places, environment_);
     if (!places) {
         return std::unexpected(Failure::start(places.error()));
@@ -72,39 +76,124 @@ std::expected<World*, Failure> CommandContext::world() {
             StandardErrorSink().write(LogLevel::info, "marrowdale: " + line);
         };
     }
-    auto opened = World::open(options);
+    return options;
+}
+
+HostRequests* CommandContext::knownRequests() const {
+    if (service_) {
+        return &service_->requests();
+    }
+    if (world_) {
+        return &world_->requests();
+    }
+    return remote_.get();
+}
+
+bool CommandContext::connectTo(const std::string& state) {
+    auto remote = RemoteRequests::connect(state);
+    if (remote) {
+        remote_ = std::move(*remote);
+    }
+    return remote.has_value();
+}
+
+template <typename Open>
+std::expected<HostRequests*, Failure> CommandContext::requestsOr(const Open& open) {
+    if (HostRequests* const known = knownRequests()) {
+        return known;
+    }
+    const auto state = stateFolder();
+    if (!state) {
+        return std::unexpected(Failure::start(state.error()));
+    }
+    if (connectTo(*state)) {
+        return remote_.get();
+    }
+    auto options = worldOptions();
+    if (!options) {
+        return std::unexpected(options.error());
+    }
+    // The process that has the state folder may be a service that has just been started.
+    options->isServed = [this, &state] { return connectTo(*state); };
+    const auto opened = open(std::move(*options));
+    if (remote_) {
+        return remote_.get();
+    }
     if (!opened) {
         return std::unexpected(Failure::start(opened.error()));
     }
-    world_ = std::move(*opened);
-    return world_.get();
+    return knownRequests();
+}
+
+std::expected<HostRequests*, Failure> CommandContext::requests() {
+    return requestsOr([this](const WorldOptions& options) -> Started<void> {
+        auto world = World::open(options);
+        if (!world) {
+            return std::unexpected(std::move(world.error()));
+        }
+        world_ = std::move(*world);
+        return {};
+    });
+}
+
+std::expected<HostRequests*, Failure> CommandContext::liveRequests() {
+    return requestsOr([this](WorldOptions options) -> Started<void> {
+        auto service = HostService::start(std::move(options));
+        if (!service) {
+            return std::unexpected(std::move(service.error()));
+        }
+        service_ = std::move(*service);
+        return {};
+    });
+}
+
+std::expected<std::unique_ptr<HostService>, Failure> CommandContext::startService() const {
+    auto options = worldOptions();
+    if (!options) {
+        return std::unexpected(options.error());
+    }
+    const std::string state = options->settings.stateFolder;
+    std::unique_ptr<RemoteRequests> running;
+    options->isServed = [&] {
+        if (auto remote = RemoteRequests::connect(state)) {
+            running = std::move(*remote);
+        }
+        return running != nullptr;
+    };
+    if (!options->isServed()) {
+        auto service = HostService::start(std::move(*options));
+        if (service) {
+            return std::move(*service);
+        }
+        if (!running) {
+            return std::unexpected(Failure::start(service.error()));
+        }
+    }
+    return std::unexpected(Failure::start(StartFailure::refusal(
+        running->serviceProcess() + " serves the state folder " + state + " already")));
 }
 
 template <typename LookUp>
 std::expected<ResolvedItem, Failure> CommandContext::resolveWith(const LookUp& lookUp) {
-    const auto opened = world();
+    const auto opened = requests();
     if (!opened) {
         return std::unexpected(opened.error());
     }
-    const ItemRequests& requests = (*opened)->requests();
-    auto identifier = lookUp(requests, PathContext{environment_, (*opened)->settings().rootPath});
+    auto identifier = lookUp(**opened);
     if (!identifier) {
-        // Only paths are looked up, so a path is what is missing.
-        return std::unexpected(Failure::nothingAt(identifier.error().subject));
+        return std::unexpected(lookUpFailure(identifier.error()));
     }
-    return ResolvedItem{requests, std::move(*identifier)};
+    return ResolvedItem{**opened, std::move(*identifier)};
 }
 
 std::expected<ResolvedItem, Failure> CommandContext::resolve(const ItemArgument& item) {
-    return resolveWith([&](const ItemRequests& requests, const PathContext& paths) {
-        return item.identifier(requests, paths);
-    });
+    return resolveWith(
+        [&](ItemRequests& requests) { return item.identifier(requests, environment_); });
 }
 
 std::expected<ResolvedItem, Failure> CommandContext::resolvePath(std::string_view path) {
-    return resolveWith([&](const ItemRequests& requests, const PathContext& paths) {
-        return identifierOfPath(path, requests, paths);
-    });
+    return resolveWith(
+        [&](ItemRequests& requests) { return identifierOfPath(path, requests, environment_); });
 }
 
 }  // namespace marrowdale::host

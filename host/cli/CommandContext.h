@@ -6,7 +6,9 @@
 #include "host/cli/ItemArgument.h"
 #include "host/cli/ItemTable.h"
 #include "host/cli/Output.h"
+#include "host/client/RemoteRequests.h"
 #include "host/daemon/Environment.h"
+#include "host/daemon/HostService.h"
 #include "host/daemon/Settings.h"
 #include "host/daemon/World.h"
 
@@ -21,7 +23,7 @@ struct GlobalOptions {
 
 // An item's identifier, and where to ask about it.
 struct ResolvedItem {
-    const ItemRequests& requests;
+    HostRequests& requests;
     std::string identifier;
 };
 
@@ -41,14 +43,26 @@ class CommandContext {
 
     [[nodiscard]] Started<std::string> rootPath() const;
     [[nodiscard]] Started<std::string> stateFolder() const;
-    // The same one each time; good as long as the context.
-    [[nodiscard]] std::expected<World*, Failure> world();
+    // Requests to the service that has the state folder or, where none runs, to a provider that is
+    // started in this process. The same ones each time; good as long as the context.
+    [[nodiscard]] std::expected<HostRequests*, Failure> requests();
+    // The same for somebody who stays: the provider in this process then records what happens and
+    // is the service of others.
+    [[nodiscard]] std::expected<HostRequests*, Failure> liveRequests();
+    // A service in this process. Refused where one runs.
+    [[nodiscard]] std::expected<std::unique_ptr<HostService>, Failure> startService() const;
 
-    // Looks an item of the command line up, in the world that is opened for it if need be.
+    // Looks an item of the command line up, by the requests above.
     [[nodiscard]] std::expected<ResolvedItem, Failure> resolve(const ItemArgument& item);
     [[nodiscard]] std::expected<ResolvedItem, Failure> resolvePath(std::string_view path);
 
+    // Why an item that was named can't be found.
+    [[nodiscard]] static Failure lookUpFailure(const Error& error);
+
   private:
+    [[nodiscard]] std::expected<WorldOptions, Failure> worldOptions() const;
+    // Whether a service answers; then requests go to it.
+    [[nodiscard]] bool connectTo(const std::string& state);
     template <typename LookUp>
     std::expected<ResolvedItem, Failure> resolveWith(const LookUp& lookUp);
 
@@ -56,7 +70,16 @@ class CommandContext {
     const GlobalOptions& options_;
     Output& output_;
     bool isOnTerminal_;
+    // The requests that there are already; null before the first.
+    [[nodiscard]] HostRequests* knownRequests() const;
+    // Those of a running service, else what `open` answers, which is given options that let it end
+    // when a service appears.
+    template <typename Open>
+    std::expected<HostRequests*, Failure> requestsOr(const Open& open);
+
+    std::unique_ptr<RemoteRequests> remote_;
     std::unique_ptr<World> world_;
+    std::unique_ptr<HostService> service_;
 };
 
 }  // namespace marrowdale::host

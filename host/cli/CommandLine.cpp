@@ -4,6 +4,8 @@
 #include <iterator>
 #include <unistd.h>
 
+#include "host/cli/AnchorCommand.h"
+#include "host/cli/ChangesCommand.h"
 #include "host/cli/DoctorCommand.h"
 #include "host/cli/HelpFormatter.h"
 #include "host/cli/IdCommand.h"
@@ -11,6 +13,8 @@
 #include "host/cli/LsCommand.h"
 #include "host/cli/PageCommand.h"
 #include "host/cli/PathCommand.h"
+#include "host/cli/ServeCommand.h"
+#include "host/cli/WatchCommand.h"
 
 namespace marrowdale::host {
 
@@ -33,6 +37,10 @@ std::vector<std::unique_ptr<Command>> allCommands() {
     commands.push_back(std::make_unique<IdCommand>());
     commands.push_back(std::make_unique<PathCommand>());
     commands.push_back(std::make_unique<PageCommand>());
+    commands.push_back(std::make_unique<AnchorCommand>());
+    commands.push_back(std::make_unique<ChangesCommand>());
+    commands.push_back(std::make_unique<WatchCommand>());
+    commands.push_back(std::make_unique<ServeCommand>());
     commands.push_back(std::make_unique<DoctorCommand>());
     return commands;
 }

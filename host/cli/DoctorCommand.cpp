@@ -6,26 +6,14 @@
 
 #include <fmt/format.h>
 
-#include "host/cli/JsonWriter.h"
 #include "host/daemon/Doctor.h"
 #include "host/daemon/HarmlessText.h"
 #include "host/daemon/Mounts.h"
+#include "host/requests/FeedJson.h"
 
 namespace marrowdale::host {
 
 namespace {
-
-std::string findingJson(const Finding& finding) {
-    JsonWriter writer;
-    writer.beginObject().key("finding").string(finding.name);
-    writer.key("status").string(statusName(finding.status));
-    writer.key("message").string(finding.message);
-    if (!finding.advice.empty()) {
-        writer.key("advice").string(finding.advice);
-    }
-    writer.endObject();
-    return writer.take();
-}
 
 std::string_view colourOf(FindingStatus status) {
     switch (status) {
@@ -69,14 +57,17 @@ void append(std::vector<Finding>& findings, std::vector<Finding> more) {
     std::ranges::move(more, std::back_inserter(findings));
 }
 
-std::vector<Finding> worldFindings(const World& world) {
-    const native::StoreReport report = world.storeReport();
-    const std::string& root = world.settings().rootPath;
-    std::vector<Finding> findings = listeningFindings(
-        report.recorder.isLive ? report.recorder : triedRecorder(root), report.reconcile.folders);
-    append(findings, storeFindings(report, mountsBelow(root)));
-    append(findings, historyFindings(report, world.retention()));
-    return findings;
+// What the provider's process tells; it is started for that where none runs.
+std::expected<std::vector<Finding>, Failure> providerFindings(CommandContext& context) {
+    const auto requests = context.requests();
+    if (!requests) {
+        return std::unexpected(requests.error());
+    }
+    auto findings = (*requests)->findings();
+    if (!findings) {
+        return std::unexpected(Failure::provider(findings.error()));
+    }
+    return std::move(*findings);
 }
 
 }  // namespace
@@ -99,19 +90,19 @@ Outcome DoctorCommand::run(CommandContext& context) {
         findings.push_back({"state", FindingStatus::problem, state.error().message, {}});
     }
     append(findings, machineFindings(context.environment()));
-    const auto world = context.world();
-    if (world) {
-        append(findings, worldFindings(**world));
+    const auto provider = providerFindings(context);
+    if (provider) {
+        append(findings, *provider);
     } else {
         append(findings,
                root ? listeningFindings(triedRecorder(*root), std::nullopt) : listeningFindings());
     }
-    if (!world && root && state) {
-        findings.push_back({"provider", FindingStatus::problem, world.error().message,
+    if (!provider && root && state) {
+        findings.push_back({"provider", FindingStatus::problem, provider.error().message,
                             "Without this nothing can be listed; mend it first."});
     }
     print(findings, context);
-    return world ? Outcome() : std::unexpected(world.error());
+    return provider ? Outcome() : std::unexpected(provider.error());
 }
 
 }  // namespace marrowdale::host

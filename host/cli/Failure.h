@@ -8,6 +8,7 @@
 
 #include "host/daemon/StartFailure.h"
 #include "platform/foundation/Error.h"
+#include "platform/hostframework/FileProviderEnumeration.h"
 
 namespace marrowdale::host {
 
@@ -28,6 +29,7 @@ struct Failure {
     std::string message;  // one line for people; may hold any bytes
     // What the kind brings along: "itemIdentifier", or "path" where somebody named one, and so on.
     std::vector<std::pair<std::string, std::string>> details;
+    FileProviderItemPtr item = nullptr;  // the one in the way, where a name was taken
 
     // An answer of the provider.
     [[nodiscard]] static Failure provider(const Error& error);

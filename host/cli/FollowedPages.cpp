@@ -10,7 +10,7 @@ namespace {
 constexpr int mostRestarts = 5;
 
 // One pass over every page.
-Expected<void> followOnce(Listing& listing, const PageTaker& take, PrintedItems& printed) {
+Expected<void> followOnce(ItemListing& listing, const PageTaker& take, PrintedItems& printed) {
     std::optional<Data> next = VantrelInitialPageSortedByName();
     while (next) {
         auto page = listing.page(*next);
@@ -30,7 +30,7 @@ Expected<void> followOnce(Listing& listing, const PageTaker& take, PrintedItems&
 
 }  // namespace
 
-Expected<void> followPages(Listing& listing, const PageTaker& take) {
+Expected<void> followPages(ItemListing& listing, const PageTaker& take) {
     PrintedItems printed;
     Expected<void> result = followOnce(listing, take, printed);
     for (int restarts = 0;

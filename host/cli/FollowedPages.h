@@ -3,7 +3,7 @@
 #include <functional>
 #include <vector>
 
-#include "host/daemon/ItemRequests.h"
+#include "host/requests/HostRequests.h"
 
 namespace marrowdale::host {
 
@@ -13,6 +13,6 @@ using PageTaker = std::function<bool(const std::vector<FileProviderItemPtr>& ite
 // Follows a listing from its first page to its last. When a page has expired (something was deleted
 // meanwhile), it starts over and leaves out what it handed over already; after it has done so five
 // times, the next expiry is the answer. Every other error is the answer at once.
-[[nodiscard]] Expected<void> followPages(Listing& listing, const PageTaker& take);
+[[nodiscard]] Expected<void> followPages(ItemListing& listing, const PageTaker& take);
 
 }  // namespace marrowdale::host

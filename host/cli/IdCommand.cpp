@@ -2,8 +2,8 @@
 
 #include <CLI/App.hpp>
 
-#include "host/cli/JsonWriter.h"
 #include "host/daemon/HarmlessText.h"
+#include "host/requests/FeedJson.h"
 
 namespace marrowdale::host {
 
@@ -17,9 +17,7 @@ Outcome IdCommand::run(CommandContext& context) {
         return std::unexpected(resolved.error());
     }
     if (context.json()) {
-        JsonWriter writer;
-        writer.beginObject().key("itemIdentifier").string(resolved->identifier).endObject();
-        context.output().writeLine(writer.take());
+        context.output().writeLine(textJson("itemIdentifier", resolved->identifier));
     } else {
         context.output().writeLine(harmlessName(resolved->identifier));
     }

@@ -2,7 +2,7 @@
 
 #include <CLI/App.hpp>
 
-#include "host/cli/ItemJson.h"
+#include "host/requests/FeedJson.h"
 
 namespace marrowdale::host {
 
@@ -20,9 +20,7 @@ Outcome InfoCommand::run(CommandContext& context) {
         return std::unexpected(Failure::provider(item.error()));
     }
     if (context.json()) {
-        JsonWriter writer;
-        appendItem(writer, **item);
-        context.output().writeLine(writer.take());
+        context.output().writeLine(itemJson(**item));
     } else {
         context.output().write(itemDetails(**item));
     }

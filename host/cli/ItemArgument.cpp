@@ -26,28 +26,6 @@ std::string withoutTrailingSlashes(std::string path) {
     return path;
 }
 
-bool liesBelow(std::string_view path, std::string_view root) {
-    return root == "/" ||
-           (path.size() > root.size() && path.starts_with(root) && path[root.size()] == '/');
-}
-
-bool isStorageRoot(const std::string& entry, const std::string& rootPath) {
-    if (entry == rootPath) {
-        return true;
-    }
-    // A link below the root that leads to the root is an item of its own.
-    return !liesBelow(entry, rootPath) && resolved(entry) == rootPath;
-}
-
-Expected<std::string> identifierAt(const std::string& path, const ItemRequests& requests,
-                                   const PathContext& context) {
-    const std::string entry = entryPath(path, context.environment);
-    if (isStorageRoot(entry, context.rootPath)) {
-        return std::string(VantrelRootContainerItemIdentifier);
-    }
-    return requests.identifierAt(URL::fileURL(entry));
-}
-
 // The byte that a text begins with in the form \udcXX; none in any other form.
 std::optional<char> writtenOutByte(std::string_view text) {
     const bool isSurrogate = text.size() >= 6 && text.starts_with("\\u") &&
@@ -81,10 +59,10 @@ bool ItemArgument::isPath() const {
     return text_.starts_with('/') || text_.starts_with("./") || text_.starts_with("../");
 }
 
-Expected<std::string> ItemArgument::identifier(const ItemRequests& requests,
-                                               const PathContext& context) const {
+Expected<std::string> ItemArgument::identifier(ItemRequests& requests,
+                                               const Environment& environment) const {
     if (isPath()) {
-        return identifierOfPath(text_, requests, context);
+        return identifierOfPath(text_, requests, environment);
     }
     if (text_ == "root") {
         return std::string(VantrelRootContainerItemIdentifier);
@@ -98,19 +76,20 @@ Expected<std::string> ItemArgument::identifier(const ItemRequests& requests,
     return text_;
 }
 
-Expected<std::string> identifierOfPath(std::string_view path, const ItemRequests& requests,
-                                       const PathContext& context) {
+Expected<std::string> identifierOfPath(std::string_view path, ItemRequests& requests,
+                                       const Environment& environment) {
     // As the system has it, an empty path is no place; it is not the working folder.
     if (path.empty()) {
         return Unexpected(errorForNonExistentItem(path));
     }
-    if (auto identifier = identifierAt(std::string(path), requests, context)) {
+    auto identifier = requests.identifierAt(entryPath(path, environment));
+    if (identifier || identifier.error() != errorForNonExistentItem({})) {
         return identifier;
     }
     // The name as it stands was tried first: it may really hold such a text.
     if (const auto bytes = withBytesOfSurrogates(path)) {
-        if (auto identifier = identifierAt(*bytes, requests, context)) {
-            return identifier;
+        if (auto itsOwn = requests.identifierAt(entryPath(*bytes, environment))) {
+            return itsOwn;
         }
     }
     return Unexpected(errorForNonExistentItem(path));

@@ -5,16 +5,10 @@
 #include <string_view>
 
 #include "host/daemon/Environment.h"
-#include "host/daemon/ItemRequests.h"
+#include "host/requests/HostRequests.h"
 #include "platform/foundation/Error.h"
 
 namespace marrowdale::host {
-
-// What paths of a command line are read against.
-struct PathContext {
-    const Environment& environment;
-    const std::string& rootPath;  // canonical
-};
 
 // An item as somebody names it on the command line: a path that begins with "/", "./" or "../", one
 // of the words "root", "working-set" and "all-directories", or an identifier, which is whatever is
@@ -27,8 +21,8 @@ class ItemArgument {
 
     // Its identifier. A path is looked up; noSuchItem, with the path as it was typed, when the
     // provider serves nothing there. Words and identifiers are not checked.
-    [[nodiscard]] Expected<std::string> identifier(const ItemRequests& requests,
-                                                   const PathContext& context) const;
+    [[nodiscard]] Expected<std::string> identifier(ItemRequests& requests,
+                                                   const Environment& environment) const;
 
   private:
     std::string text_;
@@ -36,9 +30,8 @@ class ItemArgument {
 
 // The identifier of what stands at a path, which may be relative in any form. The storage root's
 // own path, by whatever links it is reached, is the root container's.
-[[nodiscard]] Expected<std::string> identifierOfPath(std::string_view path,
-                                                     const ItemRequests& requests,
-                                                     const PathContext& context);
+[[nodiscard]] Expected<std::string> identifierOfPath(std::string_view path, ItemRequests& requests,
+                                                     const Environment& environment);
 
 // The absolute path of the entry itself: folders on the way are resolved as the system resolves
 // them, a link at the end is not followed. Where the folder it is in does not exist, the path with

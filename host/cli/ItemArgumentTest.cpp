@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "host/cli/ItemArgument.h"
+#include "host/daemon/LocalRequests.h"
 #include "host/testing/FakeExtension.h"
 #include "platform/testing/TemporaryDirectory.h"
 #include "platform/testing/TestFiles.h"
@@ -17,20 +18,23 @@ class ItemArgumentTest : public ::testing::Test {
 
     // The identifier, or the text of the error.
     [[nodiscard]] std::string look(std::string_view text) {
-        const auto identifier =
-            ItemArgument(std::string(text)).identifier(ItemRequests(extension_), context_);
+        const auto identifier = ItemArgument(std::string(text)).identifier(requests_, environment_);
         return identifier ? *identifier : "error: " + identifier.error().subject;
     }
     [[nodiscard]] std::string lookPath(std::string_view path) {
-        const auto identifier = identifierOfPath(path, ItemRequests(extension_), context_);
+        const auto identifier = identifierOfPath(path, requests_, environment_);
         return identifier ? *identifier : "error: " + identifier.error().subject;
     }
 
     TemporaryDirectory folder_;
     std::string root_ = folder_.path("root");
     Environment environment_{{}, folder_.path("root/sub")};
-    PathContext context_{environment_, root_};
     FakeExtension extension_;
+    SignalHub signals_;
+    LocalRequests requests_{
+        {.extension = extension_, .signals = signals_, .rootPath = root_, .findings = [] {
+             return std::vector<Finding>{};
+         }}};
 };
 
 TEST_F(ItemArgumentTest, wordsAreContainersAndEverythingElseIsAnIdentifier) {

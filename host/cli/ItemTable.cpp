@@ -8,9 +8,10 @@
 
 #include <fmt/format.h>
 
-#include "host/cli/ItemJson.h"
 #include "host/daemon/HarmlessText.h"
 #include "host/daemon/ReadableSize.h"
+#include "host/requests/ItemJson.h"
+#include "host/requests/TagNames.h"
 
 namespace marrowdale::host {
 

@@ -3,7 +3,7 @@
 #include <CLI/App.hpp>
 
 #include "host/cli/FollowedPages.h"
-#include "host/cli/ItemJson.h"
+#include "host/requests/ItemJson.h"
 
 namespace marrowdale::host {
 
@@ -28,13 +28,13 @@ Outcome LsCommand::run(CommandContext& context) {
     if (!resolved) {
         return std::unexpected(resolved.error());
     }
-    auto listing = resolved->requests.listing(resolved->identifier);
+    const auto listing = resolved->requests.listing(resolved->identifier);
     if (!listing) {
         return std::unexpected(Failure::provider(listing.error()));
     }
     Output& output = context.output();
     ItemTable table(context.colour());
-    const auto result = followPages(*listing, [&](const std::vector<FileProviderItemPtr>& items) {
+    const auto result = followPages(**listing, [&](const std::vector<FileProviderItemPtr>& items) {
         if (context.json()) {
             printJson(items, output);
         } else {

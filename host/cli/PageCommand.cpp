@@ -2,7 +2,7 @@
 
 #include <CLI/App.hpp>
 
-#include "host/cli/ItemJson.h"
+#include "host/requests/FeedJson.h"
 #include "platform/foundation/Base64.h"
 #include "platform/hostframework/FileProviderConstants.h"
 
@@ -25,22 +25,6 @@ std::expected<Data, Failure> pageOf(const std::string& argument) {
     return std::move(*bytes);
 }
 
-std::string pageJson(const ItemPage& page) {
-    JsonWriter writer;
-    writer.beginObject().key("items").beginArray();
-    for (const auto& item : page.items) {
-        appendItem(writer, *item);
-    }
-    writer.endArray().key("nextPage");
-    if (page.nextPage) {
-        writer.string(base64Encoded(page.nextPage->bytes()));
-    } else {
-        writer.null();
-    }
-    writer.endObject();
-    return writer.take();
-}
-
 }  // namespace
 
 void PageCommand::declareArguments(CLI::App& arguments) {
@@ -60,11 +44,11 @@ Outcome PageCommand::run(CommandContext& context) {
     if (!resolved) {
         return std::unexpected(resolved.error());
     }
-    auto listing = resolved->requests.listing(resolved->identifier);
+    const auto listing = resolved->requests.listing(resolved->identifier);
     if (!listing) {
         return std::unexpected(Failure::provider(listing.error()));
     }
-    const auto page = listing->page(*start);
+    const auto page = (*listing)->page(*start);
     if (!page) {
         return std::unexpected(Failure::provider(page.error()));
     }

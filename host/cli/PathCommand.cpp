@@ -2,8 +2,8 @@
 
 #include <CLI/App.hpp>
 
-#include "host/cli/JsonWriter.h"
 #include "host/daemon/HarmlessText.h"
+#include "host/requests/FeedJson.h"
 
 namespace marrowdale::host {
 
@@ -16,17 +16,14 @@ Outcome PathCommand::run(CommandContext& context) {
     if (!resolved) {
         return std::unexpected(resolved.error());
     }
-    const auto url = resolved->requests.urlOf(resolved->identifier);
-    if (!url) {
-        return std::unexpected(Failure::provider(url.error()));
+    const auto path = resolved->requests.pathOf(resolved->identifier);
+    if (!path) {
+        return std::unexpected(Failure::provider(path.error()));
     }
     if (context.json()) {
-        JsonWriter writer;
-        writer.beginObject().key("path").string(url->path()).endObject();
-        context.output().writeLine(writer.take());
+        context.output().writeLine(textJson("path", *path));
     } else {
-        context.output().writeLine(context.isOnTerminal() ? harmlessName(url->path())
-                                                          : url->path());
+        context.output().writeLine(context.isOnTerminal() ? harmlessName(*path) : *path);
     }
     return {};
 }

@@ -115,18 +115,6 @@ Finding typesFinding(const Environment& environment) {
 
 }  // namespace
 
-std::string_view statusName(FindingStatus status) {
-    switch (status) {
-        case FindingStatus::ok:
-            return "ok";
-        case FindingStatus::note:
-            return "note";
-        case FindingStatus::problem:
-            return "problem";
-    }
-    return "problem";
-}
-
 std::vector<Finding> rootFindings(const std::string& rootPath) {
     return {rootFinding(rootPath), trashFinding(rootPath), fileSystemFinding(rootPath),
             attributesFinding(rootPath)};

@@ -3,32 +3,15 @@
 #include <cstdint>
 #include <optional>
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "host/daemon/Environment.h"
 #include "host/daemon/Settings.h"
+#include "host/requests/Finding.h"
 #include "platform/linux/store/Retention.h"
 #include "platform/linux/store/StoreReport.h"
 
 namespace marrowdale::host {
-
-enum class FindingStatus : std::uint8_t {
-    ok,
-    note,     // works, but costs something or is switched off
-    problem,  // does not work
-};
-
-// "ok", "note", "problem".
-[[nodiscard]] std::string_view statusName(FindingStatus status);
-
-// One thing that a look at the machine brought. Texts may hold any bytes of paths.
-struct Finding {
-    std::string name;  // stable, for machines
-    FindingStatus status = FindingStatus::ok;
-    std::string message;
-    std::string advice;  // what to do about it; empty where there is nothing to do
-};
 
 // The findings below change nothing on the machine. Those of the root, the state and the machine
 // are made in Doctor.cpp; the others in WatcherFindings.cpp, StoreFindings.cpp,

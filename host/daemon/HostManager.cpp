@@ -10,21 +10,11 @@ HostManager::HostManager(const std::string& rootPath)
 void HostManager::signalEnumeratorForContainerItemIdentifier(
     std::string_view containerItemIdentifier,
     std::function<void(const std::optional<Error>&)> completionHandler) {
-    {
-        const std::lock_guard lock(mutex_);
-        signalled_.emplace(containerItemIdentifier);
-    }
+    signals_.signal(containerItemIdentifier);
     if (completionHandler) {
         // Never on the caller's thread, which may hold what the handler wants.
         handlers_.async([handler = std::move(completionHandler)] { handler(std::nullopt); });
     }
-}
-
-std::vector<std::string> HostManager::takeSignalledContainers() {
-    const std::lock_guard lock(mutex_);
-    std::vector<std::string> containers(signalled_.begin(), signalled_.end());
-    signalled_.clear();
-    return containers;
 }
 
 void HostManager::finishHandlers() const {

@@ -1,17 +1,15 @@
 #pragma once
 
-#include <mutex>
-#include <set>
 #include <string>
-#include <vector>
 
+#include "host/daemon/SignalHub.h"
 #include "platform/foundation/SerialQueue.h"
 #include "platform/hostframework/FileProviderManager.h"
 
 namespace marrowdale::host {
 
-// The host as the extension sees it: says where the storage root is, and takes its signals.
-// Signals of one container are one until somebody takes them. Any thread.
+// The host as the extension sees it: says where the storage root is, and takes its signals. Any
+// thread.
 class HostManager final : public FileProviderManager {
   public:
     // `rootPath`: absolute, without links.
@@ -22,8 +20,8 @@ class HostManager final : public FileProviderManager {
         std::string_view containerItemIdentifier,
         std::function<void(const std::optional<Error>&)> completionHandler) override;
 
-    // The containers signalled since the last call, each once, in the order of their names.
-    [[nodiscard]] std::vector<std::string> takeSignalledContainers();
+    // Where signals arrive.
+    [[nodiscard]] SignalHub& signals() { return signals_; }
 
     // Returns when every completion handler handed over so far was called. To be called before
     // what the handlers refer to goes.
@@ -31,8 +29,7 @@ class HostManager final : public FileProviderManager {
 
   private:
     URL documentStorageURL_;
-    std::mutex mutex_;
-    std::set<std::string, std::less<>> signalled_;  // guarded by mutex_
+    SignalHub signals_;
     SerialQueue handlers_;
 };
 

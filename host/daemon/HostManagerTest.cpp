@@ -8,15 +8,6 @@
 namespace marrowdale::host {
 namespace {
 
-TEST(HostManagerTest, signalsOfOneContainerAreOne) {
-    HostManager manager("/home/u/Documents");
-    manager.signalEnumeratorForContainerItemIdentifier("b", {});
-    manager.signalEnumeratorForContainerItemIdentifier("a", {});
-    manager.signalEnumeratorForContainerItemIdentifier("b", {});
-    EXPECT_THAT(manager.takeSignalledContainers(), ::testing::ElementsAre("a", "b"));
-    EXPECT_THAT(manager.takeSignalledContainers(), ::testing::IsEmpty());
-}
-
 TEST(HostManagerTest, eachHandlerIsCalledOnceWithoutAnErrorAndNotOnTheCallersThread) {
     HostManager manager("/home/u/Documents");
     int calls = 0;

@@ -2,11 +2,14 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <iterator>
 #include <string_view>
 #include <utility>
 
+#include "host/daemon/Doctor.h"
 #include "host/daemon/ExtensionModule.h"
 #include "host/daemon/HostManager.h"
+#include "host/daemon/Mounts.h"
 #include "platform/Platform.h"
 #include "platform/linux/applications/NoApplications.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
@@ -67,16 +70,29 @@ class World::Parts {
             return std::unexpected(std::move(extension.error()));
         }
         extension_ = std::move(*extension);
-        requests_.emplace(*extension_);
+        requests_.emplace(LocalServices{.extension = *extension_,
+                                        .signals = manager_.signals(),
+                                        .rootPath = options_.settings.rootPath,
+                                        .findings = [this] { return findings(); }});
         return {};
     }
 
-    [[nodiscard]] const ItemRequests& requests() const { return *requests_; }
+    [[nodiscard]] LocalRequests& requests() { return *requests_; }
     [[nodiscard]] const Settings& settings() const { return options_.settings; }
-    [[nodiscard]] const native::Store& store() const { return *store_; }
-    [[nodiscard]] const native::Retention& retention() const { return options_.retention; }
 
   private:
+    [[nodiscard]] std::vector<Finding> findings() const {
+        const native::StoreReport report = store_->report();
+        const std::string& root = options_.settings.rootPath;
+        std::vector<Finding> findings =
+            listeningFindings(report.recorder.isLive ? report.recorder : triedRecorder(root),
+                              report.reconcile.folders);
+        std::ranges::move(storeFindings(report, mountsBelow(root)), std::back_inserter(findings));
+        std::ranges::move(historyFindings(report, options_.retention),
+                          std::back_inserter(findings));
+        return findings;
+    }
+
     WorldOptions options_;
     std::unique_ptr<Log> log_;
     std::unique_ptr<native::Store> store_;
@@ -97,7 +113,7 @@ class World::Parts {
     SharedObjects shared_;
     Platform platform_;
     std::unique_ptr<FileProviderExtension> extension_;
-    std::optional<ItemRequests> requests_;
+    std::optional<LocalRequests> requests_;
 };
 
 World::World(std::unique_ptr<Parts> parts) : parts_(std::move(parts)) {}
@@ -125,7 +141,9 @@ Expected<std::unique_ptr<native::Store>> openStore(const WorldOptions& options, 
                                .cacheFolder = options.settings.cacheFolder,
                                .rootPath = options.settings.rootPath,
                                .lockWait = std::min(options.quietWait, options.lockWait),
+                               .isServed = options.isServed,
                                .log = &log,
+                               .recording = options.recording,
                                .retention = options.retention};
     auto opened = native::Store::open(store);
     if (opened || !isHeldByAnother(opened.error()) || options.quietWait >= options.lockWait) {
@@ -163,20 +181,12 @@ Started<std::unique_ptr<World>> World::open(const WorldOptions& options) {
     return std::unique_ptr<World>(new World(std::move(parts)));
 }
 
-const ItemRequests& World::requests() const {
+LocalRequests& World::requests() const {
     return parts_->requests();
 }
 
 const Settings& World::settings() const {
     return parts_->settings();
-}
-
-native::StoreReport World::storeReport() const {
-    return parts_->store().report();
-}
-
-const native::Retention& World::retention() const {
-    return parts_->retention();
 }
 
 }  // namespace marrowdale::host

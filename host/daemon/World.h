@@ -4,12 +4,12 @@
 #include <functional>
 #include <memory>
 
-#include "host/daemon/ItemRequests.h"
+#include "host/daemon/LocalRequests.h"
 #include "host/daemon/Settings.h"
 #include "host/daemon/StartFailure.h"
 #include "platform/foundation/Log.h"
 #include "platform/linux/store/Retention.h"
-#include "platform/linux/store/StoreReport.h"
+#include "platform/linux/store/StoreOptions.h"
 
 namespace marrowdale::host {
 
@@ -20,12 +20,17 @@ struct WorldOptions {
     std::string modulePath;
     // How much history is kept.
     native::Retention retention = {};
+    // Whether what happens is recorded as it happens.
+    native::StoreOptions::Recording recording = native::StoreOptions::Recording::once;
     // How long to wait for another process that has the state folder.
     std::chrono::milliseconds lockWait = std::chrono::minutes(1);
     // How much of that passes before people are told; and how they are told, with one line of text
     // (null: not at all), on the thread that opens the world.
     std::chrono::milliseconds quietWait = std::chrono::seconds(1);
     std::function<void(const std::string& line)> tellWaiting = nullptr;
+    // Asked while another process has the state folder, whenever something changes in it: true
+    // ends the waiting (the error is EALREADY).
+    std::function<bool()> isServed = nullptr;
 };
 
 // The composition root: makes everything a provider runs on (log, store, file services, registry of
@@ -33,7 +38,7 @@ struct WorldOptions {
 // where implementations are chosen. Several worlds may live in one process, each with a state
 // folder of its own.
 //
-// Threads: `requests` and `storeReport` from any.
+// Threads: the requests may be made from any.
 class World {
   public:
     // Opens the store first, which brings the index up to what is on disk. Fails when the state
@@ -47,10 +52,8 @@ class World {
     World& operator=(const World&) = delete;
 
     // Good as long as the world.
-    [[nodiscard]] const ItemRequests& requests() const;
+    [[nodiscard]] LocalRequests& requests() const;
     [[nodiscard]] const Settings& settings() const;
-    [[nodiscard]] native::StoreReport storeReport() const;
-    [[nodiscard]] const native::Retention& retention() const;
 
   private:
     class Parts;

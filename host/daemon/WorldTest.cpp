@@ -31,17 +31,17 @@ class WorldTest : public ::testing::Test {
 TEST_F(WorldTest, theExtensionAnswersThroughIt) {
     const auto world = World::open(options("one", "state"));
     ASSERT_TRUE(world.has_value()) << world.error().message;
-    const ItemRequests& requests = (*world)->requests();
-    const auto identifier = requests.identifierAt(URL::fileURL(folder_.path("one/a.txt")));
+    LocalRequests& requests = (*world)->requests();
+    const auto identifier = requests.identifierAt(folder_.path("one/a.txt"));
     ASSERT_TRUE(identifier.has_value());
-    EXPECT_EQ(requests.urlOf(*identifier)->path(), folder_.path("one/a.txt"));
+    EXPECT_EQ(*requests.pathOf(*identifier), folder_.path("one/a.txt"));
     auto listing = requests.listing(VantrelRootContainerItemIdentifier);
     ASSERT_TRUE(listing.has_value());
-    const auto page = listing->page(VantrelInitialPageSortedByName());
+    const auto page = (*listing)->page(VantrelInitialPageSortedByName());
     ASSERT_TRUE(page.has_value());
     ASSERT_EQ(page->items.size(), 1U);
     EXPECT_EQ(page->items[0]->itemIdentifier, *identifier);
-    EXPECT_EQ((*world)->storeReport().rootPath, folder_.path("one"));
+    EXPECT_TRUE(requests.findings().has_value());
 }
 
 TEST_F(WorldTest, twoWorldsLiveSideBySide) {
@@ -49,9 +49,9 @@ TEST_F(WorldTest, twoWorldsLiveSideBySide) {
     const auto two = World::open(options("two", "state two"));
     ASSERT_TRUE(one.has_value());
     ASSERT_TRUE(two.has_value()) << two.error().message;
-    const auto url = URL::fileURL(folder_.path("one/a.txt"));
-    EXPECT_TRUE((*one)->requests().identifierAt(url).has_value());
-    EXPECT_FALSE((*two)->requests().identifierAt(url).has_value());
+    const std::string path = folder_.path("one/a.txt");
+    EXPECT_TRUE((*one)->requests().identifierAt(path).has_value());
+    EXPECT_FALSE((*two)->requests().identifierAt(path).has_value());
 }
 
 TEST_F(WorldTest, aStateFolderThatIsInUseIsRefused) {

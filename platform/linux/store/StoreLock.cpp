@@ -95,7 +95,8 @@ Expected<void> writeOwner(const DiskFile& file) {
 }  // namespace
 
 Expected<StoreLock> StoreLock::take(const std::string& path,
-                                    std::optional<std::chrono::milliseconds> wait) {
+                                    std::optional<std::chrono::milliseconds> wait,
+                                    const std::function<bool()>& isServed) {
     auto file = DiskFile::open(path, O_RDWR | O_CREAT);
     if (!file) {
         return Unexpected(file.error());
@@ -103,6 +104,10 @@ Expected<StoreLock> StoreLock::take(const std::string& path,
     const Deadline deadline = wait ? Deadline(Clock::now() + *wait) : Deadline();
     const UniqueFD watch(::inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
     ::inotify_add_watch(watch.get(), path.c_str(), IN_CLOSE | IN_MODIFY);
+    if (isServed) {
+        const std::string folder = path.substr(0, path.rfind('/'));
+        ::inotify_add_watch(watch.get(), folder.c_str(), IN_CREATE | IN_MOVED_TO | IN_ONLYDIR);
+    }
     while (true) {
         const pid_t owner = ownerOf(*file);
         auto locked = tryLock(*file);
@@ -111,6 +116,9 @@ Expected<StoreLock> StoreLock::take(const std::string& path,
         }
         if (*locked) {
             break;
+        }
+        if (isServed && isServed()) {
+            return Unexpected(errorWithPOSIXCode(EALREADY, "lock", path));
         }
         const int timeout = millisecondsUntil(deadline);
         if (timeout == 0) {

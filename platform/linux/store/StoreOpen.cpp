@@ -59,7 +59,7 @@ Expected<std::unique_ptr<Store::Core>> Store::Core::open(const StoreOptions& opt
         return Unexpected(state.error());
     }
     StateFolder stateFolder(std::move(*state));
-    auto lock = StoreLock::take(stateFolder.lock(), options.lockWait);
+    auto lock = StoreLock::take(stateFolder.lock(), options.lockWait, options.isServed);
     if (!lock) {
         return Unexpected(lock.error());
     }

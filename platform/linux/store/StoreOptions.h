@@ -36,6 +36,9 @@ struct StoreOptions {
     std::string rootPath;
     // How long to wait while another process has the store. Zero: not at all; no value: for ever.
     std::optional<std::chrono::milliseconds> lockWait = std::chrono::milliseconds(0);
+    // Asked while another process has the store, whenever something appears in the state folder:
+    // true ends the waiting. May be null.
+    std::function<bool()> isServed = nullptr;
     // May be null. Must outlive the store.
     Log* log = nullptr;
     // Extended attributes whose names (without the system's prefix) begin so belong to documents:

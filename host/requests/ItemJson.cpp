@@ -1,10 +1,10 @@
-#include "host/cli/ItemJson.h"
+#include "host/requests/ItemJson.h"
 
 #include <cmath>
 #include <optional>
 
+#include "host/requests/TagNames.h"
 #include "platform/foundation/Base64.h"
-#include "platform/foundation/PropertyList.h"
 
 namespace marrowdale::host {
 
@@ -89,27 +89,6 @@ bool isWithinRFC3339(const Date& date) {
     constexpr std::int64_t yearZero = -62'167'219'200;
     constexpr std::int64_t yearTenThousand = 253'402'300'800;
     return date.seconds >= yearZero && date.seconds < yearTenThousand;
-}
-
-std::vector<std::string> tagNames(const FileProviderItem& item) {
-    std::vector<std::string> names;
-    if (!item.tagData) {
-        return names;
-    }
-    const auto list = decodePropertyList(item.tagData->bytes());
-    const auto* const tags = list ? list->as<PropertyListArray>() : nullptr;
-    if (tags == nullptr) {
-        return names;
-    }
-    for (const PropertyList& tag : *tags) {
-        const auto* const entries = tag.as<PropertyListDictionary>();
-        const auto label =
-            entries ? entries->find("label") : PropertyListDictionary::const_iterator();
-        if (entries && label != entries->end() && label->second.as<std::string>()) {
-            names.push_back(*label->second.as<std::string>());
-        }
-    }
-    return names;
 }
 
 void appendItem(JsonWriter& writer, const FileProviderItem& item) {

@@ -4,7 +4,7 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
-#include "host/cli/ItemJson.h"
+#include "host/requests/ItemJson.h"
 #include "host/testing/FakeExtension.h"
 #include "platform/foundation/PropertyList.h"
 

@@ -1,9 +1,6 @@
 #pragma once
 
-#include <string>
-#include <vector>
-
-#include "host/cli/JsonWriter.h"
+#include "host/requests/JsonWriter.h"
 #include "platform/foundation/Date.h"
 #include "platform/hostframework/FileProviderItem.h"
 
@@ -16,8 +13,5 @@ void appendItem(JsonWriter& writer, const FileProviderItem& item);
 
 // Whether RFC 3339 has a text for the date: its years have four digits.
 [[nodiscard]] bool isWithinRFC3339(const Date& date);
-
-// The names of an item's tags, from its tag data; none where that can't be read.
-[[nodiscard]] std::vector<std::string> tagNames(const FileProviderItem& item);
 
 }  // namespace marrowdale::host

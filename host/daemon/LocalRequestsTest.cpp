@@ -1,31 +1,45 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "host/daemon/ItemRequests.h"
+#include "host/daemon/LocalListing.h"
+#include "host/daemon/LocalRequests.h"
 #include "host/testing/FakeExtension.h"
 
 namespace marrowdale::host {
 namespace {
 
-TEST(ItemRequestsTest, whatTheExtensionDoesNotKnowIsNoSuchItem) {
+class LocalRequestsTest : public ::testing::Test {
+  protected:
+    LocalRequests requestsTo(FakeExtension& extension) {
+        return LocalRequests(
+            {.extension = extension, .signals = signals_, .rootPath = "/root", .findings = [] {
+                 return std::vector<Finding>{};
+             }});
+    }
+
+  private:
+    SignalHub signals_;
+};
+
+TEST_F(LocalRequestsTest, whatTheExtensionDoesNotKnowIsNoSuchItem) {
     FakeExtension extension;
-    const ItemRequests requests(extension);
-    const auto byURL = requests.identifierAt(URL::fileURL("/root/none"));
+    LocalRequests requests = requestsTo(extension);
+    const auto byURL = requests.identifierAt("/root/none");
     ASSERT_FALSE(byURL.has_value());
     EXPECT_EQ(byURL.error(), errorForNonExistentItem({}));
     EXPECT_EQ(byURL.error().subject, "/root/none");
-    const auto byIdentifier = requests.urlOf("did=9");
+    const auto byIdentifier = requests.pathOf("did=9");
     ASSERT_FALSE(byIdentifier.has_value());
     EXPECT_EQ(byIdentifier.error().subject, "did=9");
     EXPECT_FALSE(requests.item("did=9").has_value());
 }
 
-TEST(ItemRequestsTest, foldersAndContainersAreListedAndFilesAreNot) {
+TEST_F(LocalRequestsTest, foldersAndContainersAreListedAndFilesAreNot) {
     FakeExtension extension;
     extension.add("fid=1", "/root/folder").folder = true;
     extension.add("#org.example.Notes", "/notes").container = true;
     extension.add("did=2", "/root/file");
-    const ItemRequests requests(extension);
+    LocalRequests requests = requestsTo(extension);
     EXPECT_TRUE(requests.listing("fid=1").has_value());
     EXPECT_TRUE(requests.listing("#org.example.Notes").has_value());
     const auto file = requests.listing("did=2");
@@ -37,9 +51,9 @@ TEST(ItemRequestsTest, foldersAndContainersAreListedAndFilesAreNot) {
     EXPECT_EQ(none.error(), errorForNonExistentItem({}));
 }
 
-TEST(ItemRequestsTest, theSystemsContainersAreListedWithoutALookUp) {
+TEST_F(LocalRequestsTest, theSystemsContainersAreListedWithoutALookUp) {
     FakeExtension extension;
-    const ItemRequests requests(extension);
+    LocalRequests requests = requestsTo(extension);
     for (const auto container :
          {VantrelRootContainerItemIdentifier, VantrelWorkingSetContainerItemIdentifier,
           VantrelAllDirectoriesContainerItemIdentifier}) {
@@ -48,9 +62,9 @@ TEST(ItemRequestsTest, theSystemsContainersAreListedWithoutALookUp) {
     EXPECT_EQ(extension.enumerated.size(), 3U);
 }
 
-TEST(ItemRequestsTest, aPageIsItemsAndTheNextPageOrAnError) {
+TEST_F(LocalRequestsTest, aPageIsItemsAndTheNextPageOrAnError) {
     FakeEnumerator::Record record;
-    Listing listing(std::make_unique<FakeEnumerator>(
+    LocalListing listing(std::make_unique<FakeEnumerator>(
         std::vector<FakeAnswer>{{{"did=1", "did=2"}, Data::fromText("next"), {}},
                                 {{}, {}, errorSyncAnchorExpired()}},
         record));
@@ -64,11 +78,11 @@ TEST(ItemRequestsTest, aPageIsItemsAndTheNextPageOrAnError) {
     EXPECT_EQ(expired.error(), errorSyncAnchorExpired());
 }
 
-TEST(ItemRequestsTest, anEnumeratorIsInvalidatedOnceItsListingIsOver) {
+TEST_F(LocalRequestsTest, anEnumeratorIsInvalidatedOnceItsListingIsOver) {
     FakeEnumerator::Record record;
     {
-        Listing first(std::make_unique<FakeEnumerator>(std::vector<FakeAnswer>{}, record));
-        const Listing second(std::move(first));
+        const LocalListing listing(
+            std::make_unique<FakeEnumerator>(std::vector<FakeAnswer>{}, record));
         EXPECT_FALSE(record.isInvalidated);
     }
     EXPECT_TRUE(record.isInvalidated);

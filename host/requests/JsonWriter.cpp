@@ -1,4 +1,4 @@
-#include "host/cli/JsonWriter.h"
+#include "host/requests/JsonWriter.h"
 
 #include <array>
 #include <charconv>

@@ -3,7 +3,7 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
-#include "host/cli/JsonWriter.h"
+#include "host/requests/JsonWriter.h"
 
 namespace marrowdale::host {
 namespace {

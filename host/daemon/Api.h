@@ -1,0 +1,31 @@
+#pragma once
+
+#include <memory>
+
+#include "host/daemon/ApiMessages.h"
+#include "host/daemon/LocalRequests.h"
+
+namespace marrowdale::host {
+
+// The requests of docs/api.md: takes one apart, has the provider answer it, and puts the answer
+// together. Any thread, several at once.
+class Api {
+  public:
+    // The requests outlive the API and every reply that it was given.
+    explicit Api(LocalRequests& requests) : requests_(requests) {}
+
+    // Waits for the provider, but not for the client; streams of events go on after the return.
+    void handle(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply);
+
+  private:
+    [[nodiscard]] ApiAnswer answerTo(const ApiRequest& request);
+    [[nodiscard]] ApiAnswer itemAnswer(const ApiRequest& request);
+    [[nodiscard]] ApiAnswer childrenOf(const ApiRequest& request);
+    [[nodiscard]] ApiAnswer changesOf(const ApiRequest& request);
+    [[nodiscard]] ApiAnswer lookUp(const ApiRequest& request);
+    void signals(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply);
+
+    LocalRequests& requests_;
+};
+
+}  // namespace marrowdale::host

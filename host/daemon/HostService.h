@@ -1,0 +1,30 @@
+#pragma once
+
+#include <memory>
+
+#include "host/daemon/Api.h"
+#include "host/daemon/HttpServer.h"
+#include "host/daemon/World.h"
+
+namespace marrowdale::host {
+
+// A provider that other processes can talk to: a world that records what happens, and the socket in
+// its state folder. Threads: the requests may be made from any.
+class HostService {
+  public:
+    // Fails as World::open does, and when the socket can't be made. `options.recording` is live.
+    [[nodiscard]] static Started<std::unique_ptr<HostService>> start(WorldOptions options);
+
+    [[nodiscard]] LocalRequests& requests() { return world_->requests(); }
+    [[nodiscard]] const Settings& settings() const { return world_->settings(); }
+
+  private:
+    explicit HostService(std::unique_ptr<World> world)
+        : world_(std::move(world)), api_(world_->requests()) {}
+
+    std::unique_ptr<World> world_;
+    Api api_;
+    std::unique_ptr<HttpServer> server_;  // goes first
+};
+
+}  // namespace marrowdale::host
