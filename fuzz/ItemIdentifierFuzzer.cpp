@@ -24,6 +24,10 @@ class EveryDocument : public marrowdale::GenerationStore {
         const marrowdale::OpenFile& /*file*/) override {
         return marrowdale::DocumentID{1};
     }
+    marrowdale::Expected<marrowdale::DocumentID> permanentStorageForItemAtURL(
+        const marrowdale::URL& /*url*/, marrowdale::AllocateIfNone /*allocateIfNone*/) override {
+        return marrowdale::DocumentID{1};
+    }
 };
 
 }  // namespace

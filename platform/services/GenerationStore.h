@@ -1,10 +1,15 @@
 #pragma once
 
+#include <cstdint>
+
 #include "platform/foundation/Error.h"
 #include "platform/foundation/Identifiers.h"
+#include "platform/foundation/URL.h"
 #include "platform/services/FileSystem.h"
 
 namespace marrowdale {
+
+enum class AllocateIfNone : std::uint8_t { no, yes };
 
 // Gives documents their lasting numbers and finds them again. Any thread. Errors: POSIX.
 class GenerationStore {
@@ -19,6 +24,12 @@ class GenerationStore {
     // The number of the document in that file; a new one, durable when the call returns, where it
     // has none.
     [[nodiscard]] virtual Expected<DocumentID> getOrAllocateDocumentID(const OpenFile& file) = 0;
+
+    // The same for what stands at the URL (a link itself, not where it leads); with `no`, ENOENT
+    // where the file has no document yet. The look-up makes the store take note of which file
+    // stands there now, whatever it answers.
+    [[nodiscard]] virtual Expected<DocumentID> permanentStorageForItemAtURL(
+        const URL& url, AllocateIfNone allocateIfNone) = 0;
 };
 
 }  // namespace marrowdale

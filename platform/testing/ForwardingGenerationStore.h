@@ -15,6 +15,10 @@ class ForwardingGenerationStore : public GenerationStore {
     Expected<DocumentID> getOrAllocateDocumentID(const OpenFile& file) override {
         return target_.getOrAllocateDocumentID(file);
     }
+    Expected<DocumentID> permanentStorageForItemAtURL(const URL& url,
+                                                      AllocateIfNone allocateIfNone) override {
+        return target_.permanentStorageForItemAtURL(url, allocateIfNone);
+    }
 
   private:
     GenerationStore& target_;

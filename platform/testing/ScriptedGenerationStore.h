@@ -3,6 +3,8 @@
 #include <cerrno>
 #include <deque>
 #include <mutex>
+#include <string>
+#include <vector>
 
 #include "platform/services/GenerationStore.h"
 
@@ -24,6 +26,22 @@ class ScriptedGenerationStore : public GenerationStore {
         const std::lock_guard lock(mutex_);
         return next(allocations);
     }
+    // Answered like an allocation, and remembered.
+    Expected<DocumentID> permanentStorageForItemAtURL(const URL& url,
+                                                      AllocateIfNone allocateIfNone) override {
+        const std::lock_guard lock(mutex_);
+        lookUps_.push_back({url.path(), allocateIfNone});
+        return next(allocations);
+    }
+    struct LookUp {
+        std::string path;
+        AllocateIfNone allocateIfNone;
+        friend bool operator==(const LookUp&, const LookUp&) = default;
+    };
+    [[nodiscard]] std::vector<LookUp> lookUps() const {
+        const std::lock_guard lock(mutex_);
+        return lookUps_;
+    }
     [[nodiscard]] int resolveCalls() const {
         const std::lock_guard lock(mutex_);
         return resolveCalls_;
@@ -39,7 +57,8 @@ class ScriptedGenerationStore : public GenerationStore {
         return answer;
     }
     mutable std::mutex mutex_;
-    int resolveCalls_ = 0;  // guarded by mutex_
+    int resolveCalls_ = 0;         // guarded by mutex_
+    std::vector<LookUp> lookUps_;  // guarded by mutex_
 };
 
 }  // namespace marrowdale

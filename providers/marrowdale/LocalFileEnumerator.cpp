@@ -6,8 +6,8 @@
 #include "platform/foundation/FatalError.h"
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/fs/FSEventReader.h"
+#include "providers/marrowdale/fs/FSListedItems.h"
 #include "providers/marrowdale/items/LocalItem.h"
-#include "providers/marrowdale/items/ParentFolderCache.h"
 #include "providers/marrowdale/items/ProviderError.h"
 
 namespace marrowdale {
@@ -26,11 +26,6 @@ std::optional<DirectoryEnumerationOptions> optionsForRoot(const URL& url) {
                                        .skipHiddenFiles = true};
 }
 
-std::vector<std::string> listedAttributeNames() {
-    return {std::string(LocalItem::xattrLastUsedDateName), std::string(LocalItem::xattrTagDataName),
-            std::string(LocalItem::xattrFavoriteRankName)};
-}
-
 std::string joinedPaths(const std::vector<URL>& urls) {
     std::string text;
     for (const URL& url : urls) {
@@ -39,31 +34,34 @@ std::string joinedPaths(const std::vector<URL>& urls) {
     return text;
 }
 
-std::vector<FileProviderItemPtr> makeItems(const Platform& platform, const std::vector<URL>& urls) {
-    ParentFolderCache parents(platform);
-    const LocalItem::Options options{.customItemID = {},
-                                     .customParentItemID = {},
-                                     .customFilename = {},
-                                     .hasLumenoDomainIdentifier = true,
-                                     .bundleIdentifier = {}};
-    std::vector<FileProviderItemPtr> items;
-    items.reserve(urls.size());
-    for (const URL& url : urls) {
-        if (auto item = LocalItem::initWithURL(platform, url, options, &parents)) {
-            items.push_back(std::move(item));
-        }
+// Stops at an empty list, which is the first thing that is looked at.
+std::shared_ptr<FSChangesNotifier> makeNotifier(const Platform& platform,
+                                                const std::string& container,
+                                                const std::vector<URL>& urls) {
+    if (urls.empty()) {
+        fatalError("can't create enumerator for an empty list of URLs");
     }
-    return items;
+    auto notifier = FSChangesNotifier::make(platform, container, urls);
+    if (!notifier) {
+        platform.log.error("can't create notifier for \"" + urls.front().path() +
+                           "\"; enumeration will have no live update");
+    }
+    return notifier;
 }
 
 }  // namespace
 
 LocalFileEnumerator::LocalFileEnumerator(const Platform& platform, std::string container,
-                                         std::vector<URL> urls)
-    : platform_(platform), container_(std::move(container)), urls_(std::move(urls)) {
-    if (urls_.empty()) {
-        fatalError("can't create enumerator for an empty list of URLs");
-    }
+                                         std::vector<URL> urls,
+                                         UpdateFileIDInVaultry shouldUpdateFileIDInVaultry)
+    : platform_(platform),
+      container_(std::move(container)),
+      urls_(std::move(urls)),
+      notifier_(makeNotifier(platform, container_, urls_)),
+      shouldUpdateFileIDInVaultry_(shouldUpdateFileIDInVaultry) {}
+
+LocalFileEnumerator::~LocalFileEnumerator() {
+    LocalFileEnumerator::invalidate();
 }
 
 void LocalFileEnumerator::enumerateItemsForObserver(FileProviderEnumerationObserver& observer,
@@ -89,20 +87,6 @@ void LocalFileEnumerator::enumerateItemsForObserver(FileProviderEnumerationObser
     gatherPhase(observer, token);
 }
 
-void LocalFileEnumerator::enumerateChangesForObserver(
-    std::shared_ptr<FileProviderChangeObserver> observer, const Data& /*anchor*/) noexcept {
-    observer->finishEnumeratingWithError(errorSyncAnchorExpired());
-}
-
-void LocalFileEnumerator::start() noexcept {}
-
-void LocalFileEnumerator::stop() noexcept {}
-
-void LocalFileEnumerator::currentSyncAnchorWithCompletionHandler(
-    const std::function<void(const std::optional<Data>&)>& completionHandler) noexcept {
-    completionHandler(std::nullopt);
-}
-
 void LocalFileEnumerator::gatherPhase(FileProviderEnumerationObserver& observer,
                                       const std::optional<FSChangeToken>& token) {
     const auto start = startOfPage(token);
@@ -121,17 +105,16 @@ void LocalFileEnumerator::gatherPhase(FileProviderEnumerationObserver& observer,
         return;
     }
     platform_.log.debug([&] { return "discovered " + std::to_string(urls.size()) + " items"; });
-    observer.didEnumerateItems(makeItems(platform_, urls));
+    const auto items = itemsOfListing(platform_, urls);
+    observer.didEnumerateItems({items.begin(), items.end()});
     finish(observer, *start, std::move(*result));
 }
 
 Expected<LocalFileEnumerator::Start> LocalFileEnumerator::startOfPage(
     const std::optional<FSChangeToken>& token) const {
-    const auto deviceUUID = FSEventReader::volumeUUID(platform_, urls_.front());
+    const auto deviceUUID = currentDeviceUUID();
     if (!deviceUUID) {
-        const std::string& path = urls_.front().path();
-        platform_.log.error("can't get volume UUID for " + path);
-        return Unexpected(errorWithProviderCode(ProviderErrorCode::unableToGetDeviceUUID, path));
+        return Unexpected(deviceUUID.error());
     }
     if (!token) {
         platform_.log.debug([] { return "start gather phase"; });
@@ -144,14 +127,31 @@ Expected<LocalFileEnumerator::Start> LocalFileEnumerator::startOfPage(
                      .offset = 0,
                      .previousEventID = *eventID};
     }
-    if (token->deviceUUID != *deviceUUID) {
-        platform_.log.debug([&] {
-            return "device UUID changed (" + token->deviceUUID.text() + " -> " +
-                   deviceUUID->text() + ")";
-        });
-        return Unexpected(errorSyncAnchorExpired());
+    if (const auto same = checkDevice(*token, *deviceUUID); !same) {
+        return Unexpected(same.error());
     }
     return startOfNextPage(*token);
+}
+
+Expected<UUID> LocalFileEnumerator::currentDeviceUUID() const {
+    const auto deviceUUID = FSEventReader::volumeUUID(platform_, urls_.front());
+    if (!deviceUUID) {
+        const std::string& path = urls_.front().path();
+        platform_.log.error("can't get volume UUID for " + path);
+        return Unexpected(errorWithProviderCode(ProviderErrorCode::unableToGetDeviceUUID, path));
+    }
+    return *deviceUUID;
+}
+
+Expected<void> LocalFileEnumerator::checkDevice(const FSChangeToken& token,
+                                                const UUID& deviceUUID) const {
+    if (token.deviceUUID == deviceUUID) {
+        return {};
+    }
+    platform_.log.debug([&] {
+        return "device UUID changed (" + token.deviceUUID.text() + " -> " + deviceUUID.text() + ")";
+    });
+    return Unexpected(errorSyncAnchorExpired());
 }
 
 Expected<LocalFileEnumerator::Start> LocalFileEnumerator::startOfNextPage(
@@ -252,10 +252,6 @@ std::unique_ptr<DirectoryEnumerator> LocalFileEnumerator::takeRestingWalk(const 
 void LocalFileEnumerator::letRest(RestingWalk resting) {
     const std::lock_guard lock(mutex_);
     std::swap(resting_, resting);
-}
-
-void LocalFileEnumerator::invalidate() noexcept {
-    letRest({});
 }
 
 void LocalFileEnumerator::finish(FileProviderEnumerationObserver& observer, const Start& start,

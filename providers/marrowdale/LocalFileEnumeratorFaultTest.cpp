@@ -57,6 +57,37 @@ TEST(LocalFileEnumeratorFaultTest, theEventIsReadBeforeTheFirstEntryIsListed) {
     EXPECT_EQ(eventAtListing, EventID{5});
 }
 
+TEST(LocalFileEnumeratorFaultTest, withoutANotifierThereIsNoCurrentAnchor) {
+    FakePlatform fake;
+    fake.events.uuidError = errorWithPOSIXCode(ENXIO);
+    LocalFileEnumerator enumerator(fake.platform, "fid=1", {URL::fileURL("/storage/a")});
+    EXPECT_EQ(fake.sink->lines(),
+              (std::vector<std::string>{
+                  "[ERROR] can't get volume UUID for \"/storage/a\"",
+                  "[ERROR] can't create notifier for \"/storage/a\"; enumeration will have no "
+                  "live update"}));
+    int answers = 0;
+    enumerator.currentSyncAnchorWithCompletionHandler([&](const std::optional<Data>& anchor) {
+        ++answers;
+        EXPECT_EQ(anchor, std::nullopt);
+    });
+    EXPECT_EQ(answers, 1);
+    enumerator.start();
+    enumerator.stop();
+    EXPECT_TRUE(fake.events.streams().empty());
+}
+
+TEST(LocalFileEnumeratorFaultTest, whereTheCurrentEventCannotBeReadThereIsNoCurrentAnchor) {
+    FakePlatform fake;
+    LocalFileEnumerator enumerator(fake.platform, "fid=1", {URL::fileURL("/storage")});
+    fake.events.eventIDError = errorWithPOSIXCode(EIO);
+    enumerator.currentSyncAnchorWithCompletionHandler(
+        [&](const std::optional<Data>& anchor) { EXPECT_EQ(anchor, std::nullopt); });
+    EXPECT_EQ(fake.sink->count("[ERROR] can't read the current event; " +
+                               errorWithPOSIXCode(EIO).description()),
+              1U);
+}
+
 // A folder in which no identifier can be made durable.
 class FullDisk : public DirectoryEnumerator {
   public:

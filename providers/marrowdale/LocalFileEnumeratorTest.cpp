@@ -192,13 +192,17 @@ TEST_P(LocalFileEnumeratorTest, anUnreadableSubfolderIsLoggedAndSkipped) {
         1U);
 }
 
-TEST_P(LocalFileEnumeratorTest, withoutANotifierThereIsNoCurrentAnchor) {
-    int calls = 0;
-    enumerator().currentSyncAnchorWithCompletionHandler([&](const std::optional<Data>& anchor) {
-        ++calls;
-        EXPECT_EQ(anchor, std::nullopt);
-    });
-    EXPECT_EQ(calls, 1);
+TEST_P(LocalFileEnumeratorTest, aCurrentAnchorIsTheCurrentEventOfTheVolumesHistory) {
+    events_.script.eventID = EventID{77};
+    std::optional<Data> anchor;
+    enumerator().currentSyncAnchorWithCompletionHandler([&](const auto& data) { anchor = data; });
+    ASSERT_TRUE(anchor);
+    EXPECT_EQ(FSChangeToken::decode(*anchor),
+              (FSChangeToken{.version = 0,
+                             .deviceUUID = *world_.fileEvents.volumeUUID(world_.url("")),
+                             .streamEventID = 77,
+                             .offset = 0,
+                             .appLibraryVersionToken = 0}));
 }
 
 TEST_P(LocalFileEnumeratorTest, itemsResolveBackInANewProcessAfterRenames) {

@@ -33,6 +33,11 @@ Expected<DocumentID> Store::getOrAllocateDocumentID(const OpenFile& file) {
     return core_->documentOf(file);
 }
 
+Expected<DocumentID> Store::permanentStorageForItemAtURL(const URL& url,
+                                                         AllocateIfNone allocateIfNone) {
+    return core_->documentAt(url.path(), allocateIfNone);
+}
+
 Expected<EventID> Store::barrier() {
     return core_->barrier();
 }

@@ -54,6 +54,10 @@ class Store final : public GenerationStore, public EventHistory, public Document
     [[nodiscard]] Expected<FileID> resolveDocumentID(DocumentID document, DeviceID device) override;
     // The file must be below the root: ENOENT otherwise, ENXIO on another volume.
     [[nodiscard]] Expected<DocumentID> getOrAllocateDocumentID(const OpenFile& file) override;
+    // Below the root as well. What the disk says of the entry is merged into the index, and
+    // committed with what comes next.
+    [[nodiscard]] Expected<DocumentID> permanentStorageForItemAtURL(
+        const URL& url, AllocateIfNone allocateIfNone) override;
 
     // EventHistory.
     [[nodiscard]] Expected<EventID> barrier() override;

@@ -296,34 +296,4 @@ Expected<void> Store::Core::giveOut(std::span<Request> requests, std::span<const
     return {};
 }
 
-Expected<DocumentID> Store::Core::documentOf(const OpenFile& file) {
-    const std::string& path = file.url().path();
-    const auto status = statEntry(file.descriptor(), "");
-    if (!status) {
-        return Unexpected(errorWithPOSIXCode(status.error().code, "look at", path));
-    }
-    if (const DocumentID known = knownDocumentID(*status); known != DocumentID{}) {
-        return known;
-    }
-    if (status->device != device_) {
-        return Unexpected(errorWithPOSIXCode(ENXIO, "identify", path));
-    }
-    const std::string prefix = rootPath_ == "/" ? rootPath_ : rootPath_ + "/";
-    if (!path.starts_with(prefix) || path.size() == prefix.size()) {
-        return Unexpected(errorWithPOSIXCode(ENOENT, "identify", path));
-    }
-    const std::size_t slash = path.rfind('/');
-    const std::string folder = slash == 0 ? "/" : path.substr(0, slash);
-    const auto folderStatus = statEntry(AT_FDCWD, folder.c_str());
-    if (!folderStatus) {
-        return Unexpected(errorWithPOSIXCode(folderStatus.error().code, "look at", folder));
-    }
-    Request request{
-        folderStatus->fileID, folder, std::string_view(path).substr(slash + 1), *status, {}};
-    if (auto assigned = assignDocumentIDs(std::span(&request, 1)); !assigned) {
-        return Unexpected(assigned.error());
-    }
-    return request.document;
-}
-
 }  // namespace marrowdale::native

@@ -47,6 +47,9 @@ class Store::Core {
     [[nodiscard]] Expected<FileID> resolveDocumentID(DocumentID document, DeviceID device)
         MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<DocumentID> documentOf(const OpenFile& file) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<DocumentID> documentAt(const std::string& path,
+                                                  AllocateIfNone allocateIfNone)
+        MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<EventID> barrier() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] EventID lastEventID() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] EventHistory::Standing standingOf(EventID since) MARROWDALE_EXCLUDES(mutex_);
@@ -165,6 +168,10 @@ class Store::Core {
         MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] RowNumber rowOf(const Request& request) MARROWDALE_REQUIRES(mutex_);
     [[nodiscard]] RowNumber folderRow(FileID folder) MARROWDALE_REQUIRES(mutex_);
+    // For an entry below the root; what `path` points to outlives the request.
+    [[nodiscard]] Expected<Request> requestFor(const std::string& path,
+                                               const EntryStatus& status) const;
+    [[nodiscard]] Expected<DocumentID> lookUpDocument(Request& request) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] RowNumber rowOfLook(const Request& request, const Looked& looked)
         MARROWDALE_REQUIRES(mutex_);
     // The row's document; a new one, noted in `given`, where no name of the file has one. 0 when
