@@ -58,6 +58,7 @@ LAYERS = {
 TESTS_OF = {
     "providers/marrowdale": [*LINUX, "tests/support"],
     "platform/linux": INTERFACES,
+    "host": ["host/testing", "platform/linux", "platform/hostframework"],
 }
 
 # The files outside SYSTEM that may include a header of the system, with the reason.

@@ -7,9 +7,9 @@
 #include <fmt/format.h>
 
 #include "host/daemon/Doctor.h"
-#include "host/daemon/HarmlessText.h"
 #include "host/daemon/Mounts.h"
 #include "host/requests/FeedJson.h"
+#include "host/requests/HarmlessText.h"
 
 namespace marrowdale::host {
 

@@ -1,7 +1,7 @@
 #include "host/cli/Failure.h"
 
-#include "host/daemon/HarmlessText.h"
 #include "host/requests/ErrorDescription.h"
+#include "host/requests/HarmlessText.h"
 #include "host/requests/ItemJson.h"
 #include "host/requests/JsonWriter.h"
 #include "platform/hostframework/FileProviderConstants.h"

@@ -2,8 +2,8 @@
 
 #include <CLI/App.hpp>
 
-#include "host/daemon/HarmlessText.h"
 #include "host/requests/FeedJson.h"
+#include "host/requests/HarmlessText.h"
 
 namespace marrowdale::host {
 

@@ -8,8 +8,8 @@
 
 #include <fmt/format.h>
 
-#include "host/daemon/HarmlessText.h"
 #include "host/daemon/ReadableSize.h"
+#include "host/requests/HarmlessText.h"
 #include "host/requests/ItemJson.h"
 #include "host/requests/TagNames.h"
 

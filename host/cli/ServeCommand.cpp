@@ -2,10 +2,10 @@
 
 #include <CLI/App.hpp>
 
-#include "host/daemon/HarmlessText.h"
 #include "host/daemon/ServiceNotification.h"
 #include "host/daemon/StopSignals.h"
 #include "host/requests/FeedJson.h"
+#include "host/requests/HarmlessText.h"
 
 namespace marrowdale::host {
 

@@ -2,9 +2,9 @@
 
 #include <CLI/App.hpp>
 
-#include "host/daemon/HarmlessText.h"
 #include "host/daemon/StopSignals.h"
 #include "host/requests/FeedJson.h"
+#include "host/requests/HarmlessText.h"
 #include "platform/foundation/Mutex.h"
 
 namespace marrowdale::host {

@@ -5,7 +5,7 @@
 #include <filesystem>
 #include <system_error>
 
-#include "host/daemon/HarmlessText.h"
+#include "host/requests/HarmlessText.h"
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 #define MARROWDALE_KEEPS_MODULES 1

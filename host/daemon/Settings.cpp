@@ -8,7 +8,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "host/daemon/HarmlessText.h"
+#include "host/requests/HarmlessText.h"
 
 namespace marrowdale::host {
 

@@ -3,7 +3,7 @@
 #include <cerrno>
 #include <unistd.h>
 
-#include "host/daemon/HarmlessText.h"
+#include "host/requests/HarmlessText.h"
 
 namespace marrowdale::host {
 

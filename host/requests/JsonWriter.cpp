@@ -4,7 +4,7 @@
 #include <charconv>
 #include <utility>
 
-#include "host/daemon/HarmlessText.h"
+#include "host/requests/HarmlessText.h"
 
 namespace marrowdale::host {
 

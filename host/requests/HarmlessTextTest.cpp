@@ -1,6 +1,6 @@
 #include <gtest/gtest.h>
 
-#include "host/daemon/HarmlessText.h"
+#include "host/requests/HarmlessText.h"
 
 namespace marrowdale::host {
 namespace {

@@ -1,4 +1,4 @@
-#include "host/daemon/HarmlessText.h"
+#include "host/requests/HarmlessText.h"
 
 #include <array>
 #include <cstdint>
