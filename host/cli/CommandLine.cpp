@@ -13,6 +13,7 @@
 #include "host/cli/LsCommand.h"
 #include "host/cli/PageCommand.h"
 #include "host/cli/PathCommand.h"
+#include "host/cli/SearchCommand.h"
 #include "host/cli/ServeCommand.h"
 #include "host/cli/WatchCommand.h"
 
@@ -37,6 +38,7 @@ std::vector<std::unique_ptr<Command>> allCommands() {
     commands.push_back(std::make_unique<IdCommand>());
     commands.push_back(std::make_unique<PathCommand>());
     commands.push_back(std::make_unique<PageCommand>());
+    commands.push_back(std::make_unique<SearchCommand>());
     commands.push_back(std::make_unique<AnchorCommand>());
     commands.push_back(std::make_unique<ChangesCommand>());
     commands.push_back(std::make_unique<WatchCommand>());

@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include "host/cli/FollowedPages.h"
+#include "host/daemon/LocalListing.h"
 #include "host/testing/FakeExtension.h"
 
 namespace marrowdale::host {
@@ -14,7 +15,7 @@ const FakeAnswer expired{{}, {}, errorSyncAnchorExpired()};
 class FollowedPagesTest : public ::testing::Test {
   protected:
     Expected<void> follow(std::vector<FakeAnswer> answers) {
-        Listing listing(std::make_unique<FakeEnumerator>(std::move(answers), record_));
+        LocalListing listing(std::make_unique<FakeEnumerator>(std::move(answers), record_));
         return followPages(listing, [this](const std::vector<FileProviderItemPtr>& items) {
             for (const auto& item : items) {
                 printed_.push_back(item->itemIdentifier);

@@ -31,10 +31,11 @@ class ItemArgumentTest : public ::testing::Test {
     Environment environment_{{}, folder_.path("root/sub")};
     FakeExtension extension_;
     SignalHub signals_;
-    LocalRequests requests_{
-        {.extension = extension_, .signals = signals_, .rootPath = root_, .findings = [] {
-             return std::vector<Finding>{};
-         }}};
+    LocalRequests requests_{{.extension = extension_,
+                             .signals = signals_,
+                             .rootPath = root_,
+                             .replicaPath = ":memory:",
+                             .findings = [] { return std::vector<Finding>{}; }}};
 };
 
 TEST_F(ItemArgumentTest, wordsAreContainersAndEverythingElseIsAnIdentifier) {

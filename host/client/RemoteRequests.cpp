@@ -137,6 +137,20 @@ Expected<void> RemoteRequests::watch(const std::vector<std::string>& containers,
     return Unexpected(bodyOf(std::move(answer)).error());
 }
 
+Expected<std::vector<FileProviderItemPtr>> RemoteRequests::search(
+    const std::vector<std::string>& words) {
+    std::string target = "/v1/search";
+    for (const std::string& word : words) {
+        target += (target.contains('?') ? "&word=" : "?word=") + encoded(word);
+    }
+    const auto body = get(std::move(target));
+    auto page = body ? pageFromJson(*body) : Unexpected(body.error());
+    if (!page) {
+        return Unexpected(page.error());
+    }
+    return std::move(page->items);
+}
+
 Expected<std::vector<Finding>> RemoteRequests::findings() {
     const auto body = get("/v1/findings");
     return body ? findingsFromJson(*body) : Unexpected(body.error());

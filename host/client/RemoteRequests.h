@@ -37,6 +37,8 @@ class RemoteRequests final : public HostRequests {
                                        const std::function<void()>& ready, const SignalTaker& taker,
                                        std::stop_token stop) override;
 
+    [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> search(
+        const std::vector<std::string>& words) override;
     [[nodiscard]] Expected<std::vector<Finding>> findings() override;
 
   private:

@@ -108,6 +108,12 @@ ApiAnswer Api::answerTo(const ApiRequest& request) {
     if (path[1] == "lookup" && path.size() == 2) {
         return lookUp(request);
     }
+    if (path[1] == "search" && path.size() == 2) {
+        return answerOf(requests_.search(request.parameters("word")),
+                        [](const std::vector<FileProviderItemPtr>& items) {
+                            return pageJson({.items = items, .nextPage = std::nullopt});
+                        });
+    }
     if (path[1] == "findings" && path.size() == 2) {
         return answerOf(requests_.findings(), findingsJson);
     }

@@ -1,5 +1,7 @@
 #include "host/daemon/HostService.h"
 
+#include "platform/hostframework/FileProviderConstants.h"
+
 namespace marrowdale::host {
 
 Started<std::unique_ptr<HostService>> HostService::start(WorldOptions options) {
@@ -9,6 +11,9 @@ Started<std::unique_ptr<HostService>> HostService::start(WorldOptions options) {
         return std::unexpected(std::move(world.error()));
     }
     std::unique_ptr<HostService> service(new HostService(std::move(*world)));
+    if (auto watch = service->startReplica(); !watch) {
+        return std::unexpected(StartFailure::from(std::move(watch.error())));
+    }
     service->server_ = HttpServer::start(
         [&api = service->api_](ApiRequest request, std::shared_ptr<ApiReply> reply) {
             api.handle(request, reply);
@@ -18,6 +23,35 @@ Started<std::unique_ptr<HostService>> HostService::start(WorldOptions options) {
         return std::unexpected(StartFailure::from(std::move(listening.error())));
     }
     return service;
+}
+
+Expected<void> HostService::startReplica() {
+    auto watch =
+        requests().startWatch({std::string(VantrelRootContainerItemIdentifier),
+                               std::string(VantrelWorkingSetContainerItemIdentifier)},
+                              [this](std::string_view container) {
+                                  if (container == VantrelWorkingSetContainerItemIdentifier) {
+                                      replicaIsDue();
+                                  }
+                              });
+    if (!watch) {
+        return Unexpected(watch.error());
+    }
+    replicaWatch_ = std::move(*watch);
+    return {};
+}
+
+void HostService::replicaIsDue() {
+    if (isReplicaDue_.exchange(true)) {
+        return;
+    }
+    replicaQueue_.async([this] {
+        isReplicaDue_ = false;
+        if (auto followed = requests().replica().catchUp(); !followed) {
+            world_->log().error("can't bring the replica up to date; " +
+                                followed.error().description());
+        }
+    });
 }
 
 }  // namespace marrowdale::host

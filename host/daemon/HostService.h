@@ -1,15 +1,17 @@
 #pragma once
 
+#include <atomic>
 #include <memory>
 
 #include "host/daemon/Api.h"
 #include "host/daemon/HttpServer.h"
 #include "host/daemon/World.h"
+#include "platform/foundation/SerialQueue.h"
 
 namespace marrowdale::host {
 
-// A provider that other processes can talk to: a world that records what happens, and the socket in
-// its state folder. Threads: the requests may be made from any.
+// A provider that other processes can talk to: a world that records what happens, the socket in its
+// state folder, and a replica that follows. Threads: the requests may be made from any.
 class HostService {
   public:
     // Fails as World::open does, and when the socket can't be made. `options.recording` is live.
@@ -22,9 +24,15 @@ class HostService {
     explicit HostService(std::unique_ptr<World> world)
         : world_(std::move(world)), api_(world_->requests()) {}
 
+    [[nodiscard]] Expected<void> startReplica();
+    void replicaIsDue();
+
     std::unique_ptr<World> world_;
     Api api_;
-    std::unique_ptr<HttpServer> server_;  // goes first
+    std::atomic<bool> isReplicaDue_ = false;
+    SerialQueue replicaQueue_{"marrowdale.host.replica"};
+    std::unique_ptr<LocalRequests::Watch> replicaWatch_;  // uses the two above
+    std::unique_ptr<HttpServer> server_;                  // goes first
 };
 
 }  // namespace marrowdale::host

@@ -3,6 +3,7 @@
 #include <functional>
 #include <string>
 
+#include "host/daemon/ReplicaKeeper.h"
 #include "host/daemon/SignalHub.h"
 #include "host/requests/HostRequests.h"
 #include "platform/hostframework/FileProviderExtension.h"
@@ -13,7 +14,8 @@ namespace marrowdale::host {
 struct LocalServices {
     FileProviderExtension& extension;
     SignalHub& signals;
-    std::string rootPath;  // the storage root's, canonical
+    std::string rootPath;     // the storage root's, canonical
+    std::string replicaPath;  // the replica's file
     std::function<std::vector<Finding>()> findings;
 };
 
@@ -22,7 +24,8 @@ struct LocalServices {
 class LocalRequests final : public HostRequests {
   public:
     // Listings and watches must have ended before the services go.
-    explicit LocalRequests(LocalServices services) : services_(std::move(services)) {}
+    explicit LocalRequests(LocalServices services)
+        : services_(std::move(services)), replica_(*this, *this, services_.replicaPath) {}
 
     [[nodiscard]] Expected<FileProviderItemPtr> item(std::string_view identifier) override;
     [[nodiscard]] Expected<std::string> identifierAt(std::string_view path) override;
@@ -37,7 +40,13 @@ class LocalRequests final : public HostRequests {
     [[nodiscard]] Expected<void> watch(const std::vector<std::string>& containers,
                                        const std::function<void()>& ready, const SignalTaker& taker,
                                        std::stop_token stop) override;
+    [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> search(
+        const std::vector<std::string>& words) override {
+        return replica_.search(words);
+    }
     [[nodiscard]] Expected<std::vector<Finding>> findings() override;
+
+    [[nodiscard]] ReplicaKeeper& replica() { return replica_; }
 
     // Somebody who is told of signals, with the enumerators held for them; ends when it goes.
     class Watch;
@@ -49,6 +58,7 @@ class LocalRequests final : public HostRequests {
         std::string_view container);
 
     LocalServices services_;
+    ReplicaKeeper replica_;
 };
 
 class LocalRequests::Watch {

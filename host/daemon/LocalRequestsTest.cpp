@@ -11,10 +11,11 @@ namespace {
 class LocalRequestsTest : public ::testing::Test {
   protected:
     LocalRequests requestsTo(FakeExtension& extension) {
-        return LocalRequests(
-            {.extension = extension, .signals = signals_, .rootPath = "/root", .findings = [] {
-                 return std::vector<Finding>{};
-             }});
+        return LocalRequests({.extension = extension,
+                              .signals = signals_,
+                              .rootPath = "/root",
+                              .replicaPath = ":memory:",
+                              .findings = [] { return std::vector<Finding>{}; }});
     }
 
   private:

@@ -70,15 +70,18 @@ class World::Parts {
             return std::unexpected(std::move(extension.error()));
         }
         extension_ = std::move(*extension);
-        requests_.emplace(LocalServices{.extension = *extension_,
-                                        .signals = manager_.signals(),
-                                        .rootPath = options_.settings.rootPath,
-                                        .findings = [this] { return findings(); }});
+        requests_.emplace(
+            LocalServices{.extension = *extension_,
+                          .signals = manager_.signals(),
+                          .rootPath = options_.settings.rootPath,
+                          .replicaPath = options_.settings.stateFolder + "/replica.sqlite",
+                          .findings = [this] { return findings(); }});
         return {};
     }
 
     [[nodiscard]] LocalRequests& requests() { return *requests_; }
     [[nodiscard]] const Settings& settings() const { return options_.settings; }
+    [[nodiscard]] Log& log() { return *log_; }
 
   private:
     [[nodiscard]] std::vector<Finding> findings() const {
@@ -183,6 +186,10 @@ Started<std::unique_ptr<World>> World::open(const WorldOptions& options) {
 
 LocalRequests& World::requests() const {
     return parts_->requests();
+}
+
+Log& World::log() const {
+    return parts_->log();
 }
 
 const Settings& World::settings() const {

@@ -54,6 +54,7 @@ class World {
     // Good as long as the world.
     [[nodiscard]] LocalRequests& requests() const;
     [[nodiscard]] const Settings& settings() const;
+    [[nodiscard]] Log& log() const;
 
   private:
     class Parts;

@@ -81,6 +81,15 @@ class FeedRequests {
                                                const SignalTaker& taker, std::stop_token stop) = 0;
 };
 
+class SearchRequests {
+  public:
+    virtual ~SearchRequests() = default;
+    // The items whose name, or a tag of theirs, contains every word, without regard to case, in the
+    // order of their names; not those in the trash. At most ten thousand.
+    [[nodiscard]] virtual Expected<std::vector<FileProviderItemPtr>> search(
+        const std::vector<std::string>& words) = 0;
+};
+
 class ServiceRequests {
   public:
     virtual ~ServiceRequests() = default;
@@ -88,6 +97,9 @@ class ServiceRequests {
     [[nodiscard]] virtual Expected<std::vector<Finding>> findings() = 0;
 };
 
-class HostRequests : public ItemRequests, public FeedRequests, public ServiceRequests {};
+class HostRequests : public ItemRequests,
+                     public FeedRequests,
+                     public SearchRequests,
+                     public ServiceRequests {};
 
 }  // namespace marrowdale::host

@@ -5,6 +5,7 @@
 #include <nlohmann/json.hpp>
 
 #include "host/requests/ItemJson.h"
+#include "host/requests/TagNames.h"
 #include "host/testing/FakeExtension.h"
 #include "platform/foundation/PropertyList.h"
 

@@ -22,7 +22,8 @@ TEST(StartTest, helpNamesEveryCommandAndEachCommandHasItsOwn) {
     const Home home;
     const ChildResult help = home.run({"--help"});
     EXPECT_EQ(help.exitCode, 0);
-    for (const char* command : {"ls", "info", "id", "path", "page", "doctor"}) {
+    for (const char* command :
+         {"ls", "info", "id", "path", "page", "anchor", "changes", "watch", "serve", "doctor"}) {
         EXPECT_THAT(help.output, HasSubstr("\n  " + std::string(command) + " "));
         const ChildResult own = home.run({command, "--help"});
         EXPECT_EQ(own.exitCode, 0);
@@ -37,7 +38,7 @@ TEST(StartTest, aWrongCommandLineEndsWithTwoAndOneLine) {
     const Home home;
     for (const Arguments& arguments : std::vector<Arguments>{{},
                                                              {"nonsense"},
-                                                             {"serve"},
+                                                             {"serve", "x"},
                                                              {"ls", "a", "b"},
                                                              {"info"},
                                                              {"id"},

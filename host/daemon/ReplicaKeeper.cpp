@@ -1,0 +1,133 @@
+#include "host/daemon/ReplicaKeeper.h"
+
+#include <cerrno>
+#include <filesystem>
+#include <system_error>
+
+#include "platform/hostframework/FileProviderConstants.h"
+
+namespace marrowdale::host {
+
+namespace {
+
+constexpr std::int64_t mostResults = 10'000;
+constexpr int mostGatherings = 5;
+constexpr std::string_view container = VantrelWorkingSetContainerItemIdentifier;
+
+bool isDamage(const Error& error) {
+    return error.domain == ErrorDomain::posix && error.code == EUCLEAN;
+}
+
+}  // namespace
+
+template <typename Work>
+auto ReplicaKeeper::withReplica(const Work& work) -> decltype(work(std::declval<Replica&>())) {
+    const MutexLock lock(mutex_);
+    for (bool isSecondTry = false;; isSecondTry = true) {
+        if (!replica_) {
+            auto opened = Replica::open(path_);
+            if (!opened) {
+                return Unexpected(opened.error());
+            }
+            replica_.emplace(std::move(*opened));
+        }
+        auto result = work(*replica_);
+        if (result || isSecondTry || !isDamage(result.error())) {
+            return result;
+        }
+        replica_.reset();
+        std::error_code ignored;
+        std::filesystem::remove(path_, ignored);
+    }
+}
+
+Expected<void> ReplicaKeeper::catchUp() {
+    return withReplica([this](Replica& replica) { return follow(replica); });
+}
+
+Expected<std::vector<FileProviderItemPtr>> ReplicaKeeper::search(
+    std::span<const std::string> words) {
+    return withReplica([&](Replica& replica) -> Expected<std::vector<FileProviderItemPtr>> {
+        if (auto followed = follow(replica); !followed) {
+            return Unexpected(followed.error());
+        }
+        return replica.search(words, mostResults);
+    });
+}
+
+Expected<void> ReplicaKeeper::removeDomains(std::span<const std::string> domains) {
+    return withReplica([&](Replica& replica) { return replica.removeDomains(domains); });
+}
+
+Expected<void> ReplicaKeeper::follow(Replica& replica) {
+    for (int i = 0; i < mostGatherings; ++i) {
+        auto anchor = replica.anchor();
+        if (!anchor) {
+            return Unexpected(anchor.error());
+        }
+        if (*anchor) {
+            const auto followed = followFrom(replica, std::move(**anchor));
+            if (!followed || *followed) {
+                return followed ? Expected<void>() : Unexpected(followed.error());
+            }
+        }
+        // A listing that expires on the way is begun again as well.
+        if (auto gathered = gather(replica);
+            !gathered && gathered.error() != errorSyncAnchorExpired()) {
+            return gathered;
+        }
+    }
+    return Unexpected(errorSyncAnchorExpired());
+}
+
+Expected<bool> ReplicaKeeper::followFrom(Replica& replica, Data anchor) {
+    MoreComing moreComing = MoreComing::yes;
+    while (moreComing == MoreComing::yes) {
+        const auto changes = feed_.changes(container, anchor);
+        if (!changes) {
+            return changes.error() == errorSyncAnchorExpired() ? Expected<bool>(false)
+                                                               : Unexpected(changes.error());
+        }
+        // An answer that brings nothing is not worth a write.
+        if (changes->anchor != anchor || !changes->updated.empty() || !changes->deleted.empty()) {
+            if (auto applied = replica.apply(*changes); !applied) {
+                return Unexpected(applied.error());
+            }
+        }
+        anchor = changes->anchor;
+        moreComing = changes->moreComing;
+    }
+    return true;
+}
+
+Expected<void> ReplicaKeeper::gather(Replica& replica) {
+    // The anchor comes first: what happens while the folders are listed is followed from there.
+    const auto anchor = feed_.anchor(container);
+    if (!anchor) {
+        return Unexpected(anchor.error());
+    }
+    if (!*anchor) {
+        return Unexpected(errorWithPOSIXCode(ENOTSUP, "follow the changes of", container));
+    }
+    if (auto cleared = replica.clear(); !cleared) {
+        return cleared;
+    }
+    const auto listing = items_.listing(VantrelAllDirectoriesContainerItemIdentifier);
+    if (!listing) {
+        return Unexpected(listing.error());
+    }
+    std::optional<Data> next = VantrelInitialPageSortedByName();
+    while (next) {
+        auto page = (*listing)->page(*next);
+        if (!page) {
+            return Unexpected(page.error());
+        }
+        if (auto added = replica.add(page->items); !added) {
+            return added;
+        }
+        next = std::move(page->nextPage);
+    }
+    return replica.setAnchor(**anchor);
+}
+
+}  // namespace marrowdale::host
