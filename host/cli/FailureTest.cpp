@@ -25,7 +25,7 @@ TEST(FailureTest, anItemThatDoesNotExistIsNamed) {
     EXPECT_EQ(error["itemIdentifier"], "did=9");
 }
 
-TEST(FailureTest, aPathWhereNothingIsServedIsAPathAndNoIdentifier) {
+TEST(FailureTest, aPathWhereNothingIsServedIsToldAsItWasTyped) {
     const Failure failure = Failure::nothingAt("./none");
     EXPECT_EQ(failure.exitCode, ExitCode::providerError);
     EXPECT_EQ(failure.line(), "marrowdale: nothing is served at ./none");
@@ -33,7 +33,7 @@ TEST(FailureTest, aPathWhereNothingIsServedIsAPathAndNoIdentifier) {
     EXPECT_EQ(error["name"], "noSuchItem");
     EXPECT_EQ(error["code"], -1001);
     EXPECT_EQ(error["path"], "./none");
-    EXPECT_FALSE(error.contains("itemIdentifier"));
+    EXPECT_EQ(error["itemIdentifier"], "./none");
 }
 
 TEST(FailureTest, whoNamesAFileWithoutAFolderIsToldHowAPathBegins) {
