@@ -1,0 +1,115 @@
+#include <filesystem>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "host/daemon/Replica.h"
+#include "host/requests/TagNames.h"
+#include "host/testing/FakeExtension.h"
+#include "platform/testing/TemporaryDirectory.h"
+#include "platform/testing/TestFiles.h"
+
+namespace marrowdale::host {
+namespace {
+
+using namespace std::string_literals;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+std::shared_ptr<FakeItem> item(std::string_view identifier, std::string_view name,
+                               std::uint64_t fileID) {
+    auto item = std::make_shared<FakeItem>(identifier, "/root/" + std::string(name));
+    item->fileID = fileID;
+    return item;
+}
+
+class ReplicaTest : public ::testing::Test {
+  protected:
+    ReplicaTest() : replica_(Replica::open(path_).value()) {}
+
+    [[nodiscard]] std::vector<std::string> found(const std::vector<std::string>& words,
+                                                 std::int64_t limit = 100) {
+        std::vector<std::string> names;
+        for (const auto& found : replica_.search(words, limit).value()) {
+            names.push_back(found->filename);
+        }
+        return names;
+    }
+    void add(const std::vector<FileProviderItemPtr>& items) {
+        ASSERT_TRUE(replica_.add(items).has_value());
+    }
+
+    TemporaryDirectory folder_;
+    std::string path_ = folder_.path("replica");
+    Replica replica_;
+};
+
+TEST_F(ReplicaTest, anyPartOfANameOrTagIsFoundWithoutRegardToCase) {
+    auto tagged = item("did=1", "letter", 1);
+    tagged->tagData = tagDataFor(std::vector{"Important"s, "x"s});
+    add({tagged, item("did=2", "Jahresbericht ÄÖ 2026", 2), item("did=3", "a%_b\"c'*", 3)});
+    EXPECT_THAT(found({"port"}), ElementsAre("letter"));
+    EXPECT_THAT(found({"BERICHT", "20"}), ElementsAre("Jahresbericht ÄÖ 2026"));
+    EXPECT_THAT(found({"äö "}), ElementsAre("Jahresbericht ÄÖ 2026"));
+    EXPECT_THAT(found({"x"}), ElementsAre("letter"));
+    EXPECT_THAT(found({"\"c'"}), ElementsAre("a%_b\"c'*"));
+    EXPECT_THAT(found({"%"}), ElementsAre("a%_b\"c'*"));
+    EXPECT_THAT(found({"NEAR", "AND"}), IsEmpty());
+    EXPECT_EQ(found({}).size(), 3U);
+    EXPECT_EQ(found({}, 2).size(), 2U);
+}
+
+TEST_F(ReplicaTest, changesTakeTheirAnchorWithThem) {
+    add({item("did=1", "one", 1), item("did=2", "two", 2), item("fid=3", "three", 3)});
+    EXPECT_EQ(replica_.anchor().value(), std::nullopt);
+    const ItemChanges changes{
+        {item("did=2", "zwei", 2)}, {"did=1", "fid=3"}, Data::fromText("a"), {}};
+    ASSERT_TRUE(replica_.apply(changes).has_value());
+    EXPECT_THAT(found({}), ElementsAre("zwei"));
+    EXPECT_EQ(replica_.anchor().value(), Data::fromText("a"));
+}
+
+TEST_F(ReplicaTest, aDeletedFileNumberTakesTheItemOfThatNumber) {
+    add({item("did=1", "one", 7), item("did=2", "two", 8)});
+    ASSERT_TRUE(replica_.apply({{}, {"fid=7"}, Data::fromText("a"), {}}).has_value());
+    EXPECT_THAT(found({}), ElementsAre("two"));
+}
+
+TEST_F(ReplicaTest, aDomainGoesWithItsItems) {
+    auto library = item("#org.example.A", "A", 1);
+    library->hx_appContainerBundleIdentifier = "org.example.A";
+    auto document = item("did=1", "note", 2);
+    document->hx_appContainerBundleIdentifier = "org.example.A";
+    add({library, document, item("did=2", "other", 3)});
+    ASSERT_TRUE(replica_.removeDomains(std::vector{"#org.example.A"s}).has_value());
+    EXPECT_THAT(found({}), ElementsAre("other"));
+}
+
+TEST_F(ReplicaTest, itIsThereAfterItWasClosedAndClearedWhenAsked) {
+    add({item("did=1", "bytes \xFF", 1)});
+    ASSERT_TRUE(replica_.setAnchor(Data::fromText("a")).has_value());
+    replica_ = Replica::open(folder_.path("other")).value();
+    replica_ = Replica::open(path_).value();
+    EXPECT_THAT(found({"bytes"}), ElementsAre("bytes \xFF"));
+    EXPECT_EQ(replica_.anchor().value(), Data::fromText("a"));
+    ASSERT_TRUE(replica_.clear().has_value());
+    EXPECT_THAT(found({}), IsEmpty());
+    EXPECT_EQ(replica_.anchor().value(), std::nullopt);
+}
+
+TEST_F(ReplicaTest, aFileThatIsNoReplicaIsReplaced) {
+    for (const char* junk : {"", "junk", "SQLite format 3\0more"}) {
+        replica_ = Replica::open(folder_.path("other")).value();
+        writeFile(path_, junk);
+        replica_ = Replica::open(path_).value();
+        add({item("did=1", "one", 1)});
+        EXPECT_THAT(found({"one"}), ElementsAre("one"));
+    }
+}
+
+TEST_F(ReplicaTest, aFileThatCanNotBeMadeIsAnError) {
+    EXPECT_FALSE(Replica::open(folder_.path("none/replica")).has_value());
+}
+
+}  // namespace
+}  // namespace marrowdale::host
