@@ -12,7 +12,6 @@
 namespace marrowdale::host {
 namespace {
 
-using namespace std::string_literals;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
@@ -45,8 +44,9 @@ class ReplicaTest : public ::testing::Test {
 };
 
 TEST_F(ReplicaTest, anyPartOfANameOrTagIsFoundWithoutRegardToCase) {
+    const std::vector<std::string> tags{"Important", "x"};
     auto tagged = item("did=1", "letter", 1);
-    tagged->tagData = tagDataFor(std::vector{"Important"s, "x"s});
+    tagged->tagData = tagDataFor(tags);
     add({tagged, item("did=2", "Jahresbericht ÄÖ 2026", 2), item("did=3", "a%_b\"c'*", 3)});
     EXPECT_THAT(found({"port"}), ElementsAre("letter"));
     EXPECT_THAT(found({"BERICHT", "20"}), ElementsAre("Jahresbericht ÄÖ 2026"));
@@ -76,12 +76,13 @@ TEST_F(ReplicaTest, aDeletedFileNumberTakesTheItemOfThatNumber) {
 }
 
 TEST_F(ReplicaTest, aDomainGoesWithItsItems) {
+    const std::vector<std::string> domains{"#org.example.A"};
     auto library = item("#org.example.A", "A", 1);
     library->hx_appContainerBundleIdentifier = "org.example.A";
     auto document = item("did=1", "note", 2);
     document->hx_appContainerBundleIdentifier = "org.example.A";
     add({library, document, item("did=2", "other", 3)});
-    ASSERT_TRUE(replica_.removeDomains(std::vector{"#org.example.A"s}).has_value());
+    ASSERT_TRUE(replica_.removeDomains(domains).has_value());
     EXPECT_THAT(found({}), ElementsAre("other"));
 }
 

@@ -11,10 +11,9 @@
 namespace marrowdale::host {
 namespace {
 
-using namespace std::string_literals;
-
 // An item with a value in every field.
 std::shared_ptr<FakeItem> fullItem() {
+    const std::vector<std::string> tags{"red", "blau ü"};
     auto item = std::make_shared<FakeItem>("did=7", "/root/bytes \xFF\n");
     item->parentItemIdentifier = "fid=3";
     item->typeIdentifier = "text/plain";
@@ -26,7 +25,7 @@ std::shared_ptr<FakeItem> fullItem() {
     item->versionIdentifier = Data::fromText("version");
     item->isTrashed = true;
     item->lastUsedDate = Date{0, 0};
-    item->tagData = tagDataFor(std::vector{"red"s, "blau ü"s});
+    item->tagData = tagDataFor(tags);
     item->favoriteRank = Number(std::int64_t{-3});
     item->fileID = 12;
     item->docID = 7;
@@ -71,7 +70,7 @@ TEST(FeedJsonTest, pagesChangesAndAnchorsComeBackAsTheyWereWritten) {
 TEST(FeedJsonTest, whatIsNoAnswerIsNotUnderstood) {
     for (const char* text :
          {"", "[]", "{}", "7", R"({"items":[{}],"nextPage":null})", R"({"items":7})",
-          R"({"updated":[],"deleted":[1],"anchor":"","moreComing":false})",
+          R"({"updated":[],"deleted":[1],"moreComing":false})",
           R"({"findings":[{"finding":"a","status":"odd","message":""}]})"}) {
         EXPECT_EQ(itemFromJson(text).error().code, EPROTO) << text;
         EXPECT_EQ(pageFromJson(text).error().code, EPROTO) << text;
