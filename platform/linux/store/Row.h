@@ -32,6 +32,7 @@ struct alignas(64) Row {
     static constexpr std::uint32_t touchedAppeared = 1U << 29U;
     static constexpr std::uint32_t touchedChanged = 1U << 30U;
     static constexpr std::uint32_t touchedRenamed = 1U << 31U;
+    static constexpr std::uint32_t touched = touchedAppeared | touchedChanged | touchedRenamed;
     // Dirty, and more than `Index::update` changes: place, name, file or document.
     static constexpr std::uint32_t renewed = 1U << 28U;
     static constexpr std::uint32_t ageShift = 8;
@@ -71,6 +72,14 @@ struct alignas(64) Row {
     void setSubfolders(std::uint32_t count) { size = (std::uint64_t{count} << 32U) | firstChild(); }
 };
 static_assert(sizeof(Row) == 64 && std::is_trivially_copyable_v<Row>);
+
+// Whether two rows with one file number are names of one file. One whose handle could not be read
+// when it was looked at is not told apart.
+[[nodiscard]] inline bool areOneFile(const Row& one, const Row& other) {
+    const bool bothHandles = one.fingerprint != 0 && other.fingerprint != 0;
+    return one.kind() == other.kind() && one.birth == other.birth &&
+           (!bothHandles || one.fingerprint == other.fingerprint);
+}
 
 // Dates as rows hold them: compared for being the same, never ordered.
 [[nodiscard]] inline std::int64_t rowTime(const Date& date) {

@@ -224,8 +224,7 @@ std::uint32_t Store::Core::documentOfRow(RowNumber number, std::vector<RowNumber
     if (row.has(Row::severalLinks)) {
         for (const RowNumber other : index_.rowsOfFile(row.fileID)) {
             const Row& otherRow = index_.row(other);
-            if (other != number && otherRow.birth == row.birth &&
-                otherRow.fingerprint == row.fingerprint) {
+            if (other != number && areOneFile(otherRow, row)) {
                 document = otherRow.document != 0 ? otherRow.document : document;
                 names.push_back(other);
             }

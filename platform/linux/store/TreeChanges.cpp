@@ -10,9 +10,6 @@ namespace marrowdale::native {
 
 namespace {
 
-constexpr std::uint32_t touchedBits =
-    Row::touchedAppeared | Row::touchedChanged | Row::touchedRenamed;
-
 std::string joined(const std::string& folder, std::string_view name) {
     std::string path = folder;
     if (!path.empty()) {
@@ -29,7 +26,7 @@ void TreeChanges::touch(RowNumber number, std::uint32_t bits) {
         return;
     }
     Row& row = index_.row(number);
-    if (!row.has(touchedBits)) {
+    if (!row.has(Row::touched)) {
         touched_.push_back(number);
     }
     row.set(bits, true);
@@ -53,7 +50,35 @@ TreeChanges::Place TreeChanges::placeOf(RowNumber number) const {
         }
         const auto left = index_.row(up).has(Row::limbo) ? left_.find(up) : left_.end();
         if (left != left_.end()) {
-            const Place& from = left->second.place;
+            const Place& from = left->second.told.place;
+            place.package = from.package != noRow ? from.package : place.package;
+            place.path = from.path;
+            break;
+        }
+        parts.push_back(index_.name(up));
+    }
+    for (const std::string_view part : std::views::reverse(parts)) {
+        place.path = joined(place.path, part);
+    }
+    return place;
+}
+
+TreeChanges::Place TreeChanges::toldPlaceOf(RowNumber number) const {
+    Place place;
+    std::vector<std::string_view> parts;
+    for (RowNumber up = number; up != rootRow && up != noRow; up = index_.row(up).parent) {
+        const auto moved = moved_.find(up);
+        const auto left = left_.find(up);
+        const bool isMoved = moved != moved_.end();
+        const bool isPlaced = !isMoved && left == left_.end();
+        const bool wasPackage = isMoved    ? moved->second.wasPackage
+                                : isPlaced ? isPackage(up)
+                                           : left->second.told.wasPackage;
+        if (up != number && wasPackage) {
+            place.package = up;
+        }
+        if (!isPlaced) {
+            const Place& from = isMoved ? moved->second.place : left->second.told.place;
             place.package = from.package != noRow ? from.package : place.package;
             place.path = from.path;
             break;
@@ -82,10 +107,21 @@ void TreeChanges::documentGone(RowNumber number, std::uint32_t document) {
         return;
     }
     const auto moved = moved_.find(number);
-    if (moved != moved_.end() && moved->second.goneDocument == 0 &&
-        moved->second.from.package == noRow) {
+    if (moved != moved_.end() && moved->second.goneDocument == 0 && !moved->second.isGone &&
+        moved->second.place.package == noRow) {
         moved->second.goneDocument = document;
-    } else {
+    }
+    // At the old place and the new, and under each name: one of them may be hidden from whoever
+    // knows another.
+    for (const RowNumber name : index_.rowsOfFile(index_.row(number).fileID)) {
+        if (name == number || areOneFile(index_.row(name), index_.row(number))) {
+            goneDocuments_.push_back({name, document});
+        }
+    }
+}
+
+void TreeChanges::documentLeft(RowNumber number, std::uint32_t document) {
+    if (!silent_) {
         goneDocuments_.push_back({number, document});
     }
 }
@@ -98,7 +134,11 @@ void TreeChanges::leave(RowNumber number) {
                                row.isFolder(), folder, std::string(index_.name(number)),
                                index_.attributes(number)});
     }
-    left_.insert_or_assign(number, Left{placeOf(number), folder, isPackage(number)});
+    Told told{.place = toldPlaceOf(number), .wasPackage = isPackage(number)};
+    if (const auto moved = moved_.extract(number)) {
+        told = std::move(moved.mapped());  // the place where it was told of last
+    }
+    left_.insert_or_assign(number, Left{.told = std::move(told), .folder = folder});
     index_.putInLimbo(number);
 }
 
@@ -107,20 +147,15 @@ bool TreeChanges::arrive(RowNumber number, RowNumber folder, std::string_view na
     if (!index_.place(number, folder, name)) {
         return false;
     }
-    const auto left = left_.find(number);
-    if (left == left_.end()) {
-        // It went before the run that began with it in limbo: where from is not known any more.
-        appeared(number);
-        return true;
+    if (auto left = left_.extract(number)) {
+        arrivals_.push_back(
+            {FileID{index_.row(folder).fileID}, std::string(name), left.mapped().folder, fromName});
+        if (!silent_) {
+            moved_.insert_or_assign(number, std::move(left.mapped().told));
+        }
     }
-    arrivals_.push_back(
-        {FileID{index_.row(folder).fileID}, std::string(name), left->second.folder, fromName});
-    if (!silent_) {
-        moved_.try_emplace(number,
-                           Moved{std::move(left->second.place), left->second.wasPackage, 0});
-        touch(number, Row::touchedRenamed);
-    }
-    left_.erase(left);
+    // Without: it went before the run that began with it in limbo, and that was told then.
+    touch(number, Row::touchedRenamed);
     return true;
 }
 
@@ -142,6 +177,15 @@ void TreeChanges::putGone(RowNumber number, const std::string& path, std::uint32
                .path = path});
 }
 
+// Without a file: it is there, under another identifier, or was told to be gone before.
+void TreeChanges::putGoneDocument(const std::string& path, std::uint32_t document) {
+    gone_.add({.id = {},
+               .flags = FileEventFlag::gone,
+               .fileID = {},
+               .goneDocument = DocumentID{document},
+               .path = path});
+}
+
 bool TreeChanges::hasServedName(std::uint32_t document) const {
     return std::ranges::any_of(index_.rowsOfDocument(document), [&](RowNumber number) {
         return !index_.row(number).has(Row::limbo) && placeOf(number).package == noRow;
@@ -150,14 +194,30 @@ bool TreeChanges::hasServedName(std::uint32_t document) const {
 
 void TreeChanges::noteOtherNames(RowNumber number) {
     const Row& row = index_.row(number);
-    if (!row.has(Row::severalLinks)) {
+    if (silent_ || row.isFolder()) {
         return;
     }
+    // Whatever the row says of links: it may have been looked at when the others were there no
+    // more, or not yet.
     for (const RowNumber other : index_.rowsOfFile(row.fileID)) {
-        const Row& otherRow = index_.row(other);
-        if (other != number && otherRow.birth == row.birth &&
-            otherRow.fingerprint == row.fingerprint) {
+        if (other != number && areOneFile(index_.row(other), row)) {
             otherNames_.push_back(other);
+        }
+    }
+}
+
+void TreeChanges::noteOtherNamesBelow(RowNumber folder) {
+    std::vector<RowNumber> left{folder};
+    while (!left.empty()) {
+        const RowNumber above = left.back();
+        left.pop_back();
+        for (RowNumber below = index_.row(above).firstChild(); below != noRow;
+             below = index_.row(below).next) {
+            if (index_.row(below).isFolder()) {
+                left.push_back(below);
+            } else if (index_.row(below).has(Row::severalLinks)) {
+                noteOtherNames(below);
+            }
         }
     }
 }
@@ -171,7 +231,12 @@ void TreeChanges::putBelow(RowNumber folder, const std::string& path, Side side,
         for (RowNumber below = index_.row(above).firstChild(); below != noRow;
              below = index_.row(below).next) {
             std::string belowPath = joined(abovePath, index_.name(below));
-            if (side == Side::gone) {
+            if (side == Side::gone && moved_.contains(below)) {
+                // It came there a moment ago, and is known at another place.
+                if (forgets) {
+                    tellRemoved(below, moved_.extract(below).mapped());
+                }
+            } else if (side == Side::gone) {
                 std::uint32_t document = forgets ? takeDocument(below) : index_.row(below).document;
                 if (!forgets && document != 0 && hasServedName(document)) {
                     document = 0;
@@ -190,29 +255,51 @@ void TreeChanges::putBelow(RowNumber folder, const std::string& path, Side side,
     }
 }
 
+void TreeChanges::tellGone(RowNumber number, const Told& told) {
+    if (told.place.package != noRow) {
+        packagesChanged_.push_back(told.place.package);
+        return;
+    }
+    const bool wasOpen = index_.row(number).isFolder() && !told.wasPackage;
+    putGone(number, told.place.path,
+            FileEventFlag::renamed | (wasOpen ? FileEventFlag::isFolder : 0), told.goneDocument);
+    noteOtherNames(number);
+}
+
+void TreeChanges::tellRemoved(RowNumber number, const Told& told) {
+    if (told.place.package != noRow) {
+        packagesChanged_.push_back(told.place.package);
+        return;
+    }
+    const std::string& path = told.place.path;
+    if (told.goneDocument != 0) {
+        putGoneDocument(path, told.goneDocument);
+    }
+    const std::uint32_t document = takeDocument(number);
+    if (!told.isGone) {
+        putGone(number, path, told.wasPackage ? 0 : kindFlags(number), document);
+        noteOtherNames(number);
+    } else if (document != 0) {
+        putGoneDocument(path, document);
+    }
+}
+
 void TreeChanges::remove(RowNumber number) {
-    const auto left = left_.find(number);
-    const Place place = left != left_.end() ? left->second.place : placeOf(number);
-    const bool wasPackage = left != left_.end() ? left->second.wasPackage : isPackage(number);
-    // One that moved before it went: the place where it was told of last is the first of them.
-    const auto moved = moved_.find(number);
-    const Place& last = moved != moved_.end() ? moved->second.from : place;
-    if (silent_) {
-        // Nobody was told of it.
-    } else if (last.package != noRow) {
-        packagesChanged_.push_back(last.package);
+    Told told;
+    if (auto left = left_.extract(number)) {
+        told = std::move(left.mapped().told);
     } else {
-        const std::uint32_t document = takeDocument(number);
-        putGone(number, last.path, wasPackage ? 0 : kindFlags(number), document);
-        if (index_.row(number).isFolder() && !wasPackage) {
-            putBelow(number, last.path, Side::gone, true);
+        // What was in limbo when an earlier run made its last commit was told of then.
+        told = {.place = placeOf(number), .wasPackage = isPackage(number), .isGone = true};
+    }
+    if (!silent_) {
+        tellRemoved(number, told);
+        const bool wasOpen = index_.row(number).isFolder() && !told.wasPackage;
+        if (wasOpen && told.place.package == noRow) {
+            putBelow(number, told.place.path, Side::gone, true);
         }
     }
-    if (left != left_.end()) {
-        left_.erase(left);
-    }
-    moved_.erase(number);
-    noteRemovedFolders(number);
+    noteRemoved(number);
     index_.remove(number);
 }
 
@@ -220,11 +307,15 @@ std::vector<FileID> TreeChanges::takeRemovedFolders() {
     return std::exchange(removedFolders_, {});
 }
 
-void TreeChanges::noteRemovedFolders(RowNumber number) {
+void TreeChanges::noteRemoved(RowNumber number) {
     std::vector<RowNumber> left{number};
     while (!left.empty()) {
-        const Row& row = index_.row(left.back());
+        const RowNumber next = left.back();
         left.pop_back();
+        if (auto moved = moved_.extract(next)) {
+            tellRemoved(next, moved.mapped());  // it came into a package, and is known elsewhere
+        }
+        const Row& row = index_.row(next);
         if (!row.isFolder()) {
             continue;
         }
@@ -241,135 +332,6 @@ std::vector<TreeChanges::Departure> TreeChanges::takeDepartures() {
 
 std::vector<TreeChanges::Arrival> TreeChanges::takeArrivals() {
     return std::exchange(arrivals_, {});
-}
-
-bool TreeChanges::hasChanges() const {
-    return !touched_.empty() || !gone_.empty() || !rest_.empty() || !goneDocuments_.empty() ||
-           !packagesChanged_.empty();
-}
-
-void TreeChanges::flush(EventBatch& batch) {
-    std::vector<RowNumber> waiting;
-    for (const RowNumber number : touched_) {
-        Row& row = index_.row(number);
-        const std::uint32_t bits = row.flags & touchedBits;
-        if (row.isFree() || bits == 0) {
-            continue;
-        }
-        if (row.has(Row::limbo)) {
-            waiting.push_back(number);
-            continue;
-        }
-        row.set(touchedBits, false);
-        flushRow(number, bits);
-    }
-    touched_ = std::move(waiting);
-    flushGoneDocuments();
-    flushPackages();
-    flushOtherNames();
-    const auto add = [&batch](const StoredEvent& event) { batch.add(event); };
-    gone_.forEach(add);
-    rest_.forEach(add);
-    gone_.clear();
-    rest_.clear();
-}
-
-void TreeChanges::flushRow(RowNumber number, std::uint32_t bits) {
-    const Place now = placeOf(number);
-    const auto moved = moved_.find(number);
-    if (moved != moved_.end()) {
-        flushMove(number, moved->second, now);
-        moved_.erase(moved);
-        return;
-    }
-    if (now.package != noRow) {
-        packagesChanged_.push_back(now.package);
-        return;
-    }
-    const bool isNew = (bits & Row::touchedAppeared) != 0;
-    rest_.add(
-        {.flags = (isNew ? FileEventFlag::appeared : FileEventFlag::changed) | kindFlags(number),
-         .fileID = FileID{index_.row(number).fileID},
-         .path = now.path});
-}
-
-// Two events, and more where what lies below comes to be served, or is served no longer: a folder
-// that became a package, or came out of one.
-void TreeChanges::flushMove(RowNumber number, const Moved& moved, const Place& now) {
-    const bool isFolder = index_.row(number).isFolder();
-    const bool wasOpen = isFolder && !moved.wasPackage && moved.from.package == noRow;
-    const bool isOpen = isFolder && !isPackage(number) && now.package == noRow;
-    if (moved.from.package != noRow) {
-        packagesChanged_.push_back(moved.from.package);
-    } else if (moved.from.path != now.path) {
-        putGone(number, moved.from.path,
-                FileEventFlag::renamed | (wasOpen ? FileEventFlag::isFolder : 0),
-                moved.goneDocument);
-    } else if (moved.goneDocument != 0) {
-        goneDocuments_.push_back({number, moved.goneDocument});
-    }
-    if (wasOpen && !isOpen) {
-        putBelow(number, moved.from.path, Side::gone, false);
-    }
-    if (now.package != noRow) {
-        packagesChanged_.push_back(now.package);
-        return;
-    }
-    const bool cameIn = moved.from.package != noRow;
-    rest_.add(
-        {.flags = (cameIn ? FileEventFlag::appeared : FileEventFlag::renamed) | kindFlags(number),
-         .fileID = FileID{index_.row(number).fileID},
-         .path = now.path});
-    if (isOpen && !wasOpen) {
-        putBelow(number, now.path, Side::appeared, false);
-    }
-}
-
-void TreeChanges::flushGoneDocuments() {
-    for (const GoneDocument& gone : goneDocuments_) {
-        if (!index_.row(gone.row).isFree()) {
-            const Place place = placeOf(gone.row);
-            // Without a file: it is there, under another identifier.
-            gone_.add({.id = {},
-                       .flags = FileEventFlag::gone,
-                       .fileID = {},
-                       .goneDocument = DocumentID{gone.document},
-                       .path = place.path});
-        }
-    }
-    goneDocuments_.clear();
-}
-
-void TreeChanges::flushOtherNames() {
-    std::ranges::sort(otherNames_);
-    const auto repeated = std::ranges::unique(otherNames_);
-    otherNames_.erase(repeated.begin(), repeated.end());
-    for (const RowNumber number : otherNames_) {
-        if (index_.row(number).isFree() || index_.row(number).has(Row::limbo)) {
-            continue;
-        }
-        const Place place = placeOf(number);
-        if (place.package == noRow) {
-            rest_.add({.flags = FileEventFlag::changed | kindFlags(number),
-                       .fileID = FileID{index_.row(number).fileID},
-                       .path = place.path});
-        }
-    }
-    otherNames_.clear();
-}
-
-void TreeChanges::flushPackages() {
-    std::ranges::sort(packagesChanged_);
-    const auto repeated = std::ranges::unique(packagesChanged_);
-    packagesChanged_.erase(repeated.begin(), repeated.end());
-    for (const RowNumber number : packagesChanged_) {
-        if (!index_.row(number).isFree() && !index_.row(number).has(Row::limbo)) {
-            rest_.add({.flags = FileEventFlag::changed,
-                       .fileID = FileID{index_.row(number).fileID},
-                       .path = placeOf(number).path});
-        }
-    }
-    packagesChanged_.clear();
 }
 
 }  // namespace marrowdale::native

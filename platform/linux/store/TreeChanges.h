@@ -1,5 +1,6 @@
 #pragma once
 
+#include <compare>
 #include <cstdint>
 #include <string>
 #include <string_view>
@@ -31,11 +32,16 @@ class TreeChanges {
     // Of placed rows.
     void appeared(RowNumber number) { touch(number, Row::touchedAppeared); }
     void changed(RowNumber number) { touch(number, Row::touchedChanged); }
+    // It stands where it stood, but was away for a moment. Whoever was told of it, or of something
+    // below it, and looked in that moment, took it for gone.
+    void returned(RowNumber number) { touch(number, Row::touchedRenamed); }
     // The document came to rest on another file.
     void documentMoved(DeviceID device, std::uint32_t document, std::uint64_t from,
                        std::uint64_t to);
     // The file of that row had this document and has it no more, and no other file has.
     void documentGone(RowNumber number, std::uint32_t document);
+    // The file of that row, which stands, had this document and has it no more: another file has.
+    void documentLeft(RowNumber number, std::uint32_t document);
 
     // Takes a placed row off its place: it may be found elsewhere before `remove`.
     void leave(RowNumber number);
@@ -70,7 +76,9 @@ class TreeChanges {
 
     // Whether there is something to flush.
     [[nodiscard]] bool hasChanges() const;
-    // Appends the events of everything noted so far. Rows in limbo stay noted.
+    // Appends the events of everything noted so far. What is in limbo is told to be gone from where
+    // it was: its number may be another file's by the next time, and a later run would not know the
+    // place any more.
     void flush(EventBatch& batch);
 
   private:
@@ -78,24 +86,28 @@ class TreeChanges {
         std::string path;
         RowNumber package = noRow;  // the topmost one above
     };
-    struct Left {
+    // What the events so far say of a row that has left its place.
+    struct Told {
         Place place;
-        FileID folder{};
         bool wasPackage = false;
+        bool isGone = false;             // that it is not there any more
+        std::uint32_t goneDocument = 0;  // to be told yet
     };
-    struct Moved {
-        Place from;
-        bool wasPackage = false;
-        std::uint32_t goneDocument = 0;
+    struct Left {
+        Told told;
+        FileID folder{};
     };
     struct GoneDocument {
         RowNumber row;
         std::uint32_t document;
+        auto operator<=>(const GoneDocument&) const = default;
     };
     enum class Side : std::uint8_t { gone, appeared };
 
     void touch(RowNumber number, std::uint32_t bits);
     [[nodiscard]] Place placeOf(RowNumber number) const;
+    // Where the events so far say that it is: deletions are of what somebody was told of.
+    [[nodiscard]] Place toldPlaceOf(RowNumber number) const;
     [[nodiscard]] bool isPackage(RowNumber number) const;
     [[nodiscard]] std::uint32_t kindFlags(RowNumber number) const;
     // The row's document when no other row has it; the row has none afterwards.
@@ -104,14 +116,24 @@ class TreeChanges {
                  std::uint32_t document);
     // Whether a name of the document is served, beside those that lie in packages.
     [[nodiscard]] bool hasServedName(std::uint32_t document) const;
-    // A name of that file went without a change of the file itself: whoever goes by the file's
-    // number is to know that it has others.
+    // A name of that file is told to be gone: whoever goes by the file's number is to know that it
+    // has others.
     void noteOtherNames(RowNumber number);
+    // The same for the files below a folder that was somewhere else, or nowhere, for somebody.
+    void noteOtherNamesBelow(RowNumber folder);
+    // It is not there any more; perhaps it was moved.
+    void tellGone(RowNumber number, const Told& told);
+    // It is nowhere any more. The row is about to be freed.
+    void tellRemoved(RowNumber number, const Told& told);
+    void putGoneDocument(const std::string& path, std::uint32_t document);
     // Events for what lies below a folder that stands, or stood, at `path`.
     void putBelow(RowNumber folder, const std::string& path, Side side, bool forgets);
-    void noteRemovedFolders(RowNumber number);
+    // The row and all below it are about to be freed.
+    void noteRemoved(RowNumber number);
+    void flushLimbo();
+    void flushTouched();
     void flushRow(RowNumber number, std::uint32_t bits);
-    void flushMove(RowNumber number, const Moved& moved, const Place& now);
+    void flushMove(RowNumber number, const Told& told, const Place& now);
     void flushGoneDocuments();
     void flushPackages();
     void flushOtherNames();
@@ -120,10 +142,11 @@ class TreeChanges {
     const PackageTypes& packages_;
     bool silent_ = false;
     std::vector<RowNumber> touched_;  // have one of the row's touched bits; some may be free by now
-    std::unordered_map<RowNumber, Left> left_;    // in limbo
-    std::unordered_map<RowNumber, Moved> moved_;  // placed again
+    std::unordered_map<RowNumber, Left> left_;   // in limbo
+    std::unordered_map<RowNumber, Told> moved_;  // placed again, and not told of yet
     std::vector<RowNumber> packagesChanged_;
     std::vector<RowNumber> otherNames_;
+    std::vector<RowNumber> told_;  // by the flush that runs, where they stand
     std::vector<GoneDocument> goneDocuments_;
     std::vector<Departure> departures_;
     std::vector<Arrival> arrivals_;
