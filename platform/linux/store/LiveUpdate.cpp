@@ -201,6 +201,10 @@ void LiveUpdate::merge(const Found& found) {
         left_.hints.push_back(*found.hint);  // folders are being moved about
         return;
     }
+    constexpr std::uint32_t wasAway = WatchHint::movedTo | WatchHint::gone;
+    if (wasKnown && row == before && (found.hint->what & wasAway) != 0) {
+        scope_.changes.returned(row);
+    }
     tellArrival(*found.hint, found);
     const bool isNew = scope_.index.count() > count;
     if (scope_.index.row(row).isFolder()) {

@@ -236,6 +236,43 @@ TEST_P(StoreEventsTest, ANameThatIsMovedOutWithItsFolderLeavesTheOthers) {
     EXPECT_EQ(documentOf("a"), document);
 }
 
+TEST_P(StoreEventsTest, ANameThatIsRenamedLeavesTheOthers) {
+    write("a");
+    link("a", "b");
+    begin();
+    const auto document = documentOf("a");
+    (void)news();
+    rename("a", "c");
+    // Where nobody listened, one name went and another came.
+    const std::vector<std::string> live{"gone+renamed a", "renamed c", "changed b"};
+    const std::vector<std::string> result{"gone a", "changed b", "appeared c"};
+    EXPECT_THAT(newsOnce(), testing::UnorderedElementsAreArray(isLive() ? live : result));
+    EXPECT_EQ(documentOf("b"), document);
+}
+
+// Whoever read events meanwhile found nothing where they say. What nobody could read of is not
+// told.
+TEST_P(StoreEventsTest, AFolderThatWasAwayForAMomentIsToldToBeBack) {
+    write("folder/a");
+    link("folder/a", "b");
+    begin();
+    rename("folder", "elsewhere");
+    rename("elsewhere", "folder");
+    const std::vector<std::string> back{"renamed folder/", "changed b"};
+    EXPECT_EQ(newsOnce(), isLive() ? back : std::vector<std::string>());
+}
+
+TEST_P(StoreEventsTest, AFileThatWasAwayForAMomentIsToldWithItsOtherNames) {
+    write("a");
+    link("a", "b");
+    begin();
+    rename("a", "elsewhere");
+    rename("elsewhere", "a");
+    // Where nobody listened, its times tell.
+    EXPECT_THAT(newsOnce(),
+                UnorderedElementsAre(isLive() ? "renamed a" : "changed a", "changed b"));
+}
+
 TEST_P(StoreEventsTest, AWriteThroughANameOutsideTheTree) {
     write("a");
     const std::string outside = root() + "-outside";
