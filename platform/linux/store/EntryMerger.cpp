@@ -146,6 +146,25 @@ void EntryMerger::refreshOtherNames(RowNumber number, const EntryLook& look) {
     }
 }
 
+bool EntryMerger::isEarlierFile(const Row& row, const EntryLook& look) {
+    const std::int64_t birth = rowBirth(look.status);
+    const bool otherBirth = row.birth != 0 && birth != 0 && row.birth != birth;
+    const bool otherHandle =
+        row.fingerprint != 0 && look.fingerprint != 0 && row.fingerprint != look.fingerprint;
+    return otherBirth || otherHandle || row.kind() != rowKind(look.status);
+}
+
+// Its number is another file's now, so it is nowhere any more; and that must be told no later than
+// of the other file, for deletions are told by the number.
+void EntryMerger::leaveEarlier(const EntryLook& look) {
+    for (const RowNumber number : index_.rowsOfFile(raw(look.status.fileID))) {
+        const Row& row = index_.row(number);
+        if (number != rootRow && !row.has(Row::limbo) && isEarlierFile(row, look)) {
+            changes_.leave(number);
+        }
+    }
+}
+
 RowNumber EntryMerger::addName(RowNumber folder, std::string_view name, const EntryLook& look,
                                const Kin& kin) {
     Row values = valuesOf(look);
@@ -182,6 +201,7 @@ RowNumber EntryMerger::merge(RowNumber folder, std::string_view name, const Entr
     if (current != noRow) {
         changes_.leave(current);
     }
+    leaveEarlier(look);
     const bool isInLimbo = kin.row != noRow && index_.row(kin.row).has(Row::limbo);
     const bool hasOneName = look.status.isDirectory() || look.status.linkCount <= 1;
     if (kin.row == noRow || kin.row == rootRow || (!isInLimbo && !hasOneName)) {

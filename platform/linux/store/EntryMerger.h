@@ -67,6 +67,9 @@ class EntryMerger {
         std::uint32_t document = 0;
     };
     [[nodiscard]] Kin findKin(const EntryLook& look, RowNumber except) const;
+    // Whether the row's file had the number before the file that was found.
+    [[nodiscard]] static bool isEarlierFile(const Row& row, const EntryLook& look);
+    void leaveEarlier(const EntryLook& look);
     void refresh(RowNumber number, const EntryLook& look);
     void refreshOtherNames(RowNumber number, const EntryLook& look);
     [[nodiscard]] RowNumber addName(RowNumber folder, std::string_view name, const EntryLook& look,

@@ -43,5 +43,29 @@ TEST(EntryMergerTest, TheSizeOfAFolderMeansNothing) {
     EXPECT_TRUE(EntryMerger::isUnchanged(EntryMerger::valuesOf(look), grown));
 }
 
+// Deletions are told by the number: that of the earlier file must not come after the later one.
+TEST(EntryMergerTest, AFileWhoseNumberIsAnothersNowHasLeft) {
+    const PackageTypes packages;
+    Index index;
+    TreeChanges changes(index, packages);
+    SafeSaves saves(index, changes);
+    EntryMerger merger(index, changes, saves);
+    EntryLook root = lookAt(folderMode);
+    root.status.fileID = FileID{2};
+    (void)index.add(noRow, {}, EntryMerger::valuesOf(root));
+    const EntryLook earlier = lookAt(fileMode);
+    EntryLook later = earlier;
+    later.status.birth = {1'500, 0};
+    const RowNumber first = merger.merge(rootRow, "first", earlier);
+    ASSERT_NE(first, noRow);
+    const RowNumber link = merger.merge(rootRow, "link", earlier);
+    ASSERT_NE(link, noRow);
+    const RowNumber second = merger.merge(rootRow, "second", later);
+    ASSERT_NE(second, noRow);
+    EXPECT_TRUE(index.row(first).has(Row::limbo));
+    EXPECT_TRUE(index.row(link).has(Row::limbo));
+    EXPECT_FALSE(index.row(second).has(Row::limbo));
+}
+
 }  // namespace
 }  // namespace marrowdale::native

@@ -323,6 +323,36 @@ TEST_P(StoreEventsTest, AnInodeNumberThatIsGivenToAnotherFile) {
     }
 }
 
+// Where nobody listens, the new file is known first, because somebody asks for its identifier.
+TEST_P(StoreEventsTest, AFileIsGoneNoLaterThanItsNumberIsToldAsAnothers) {
+    write("first");
+    begin();
+    (void)news();
+    for (int i = 0; i < 50; ++i) {
+        bool isReused = false;
+        withStore([&] {
+            const auto number = status("first").fileID;
+            remove("first");
+            write("second");
+            isReused = status("second").fileID == number;
+            (void)assign("");
+        });
+        const auto texts = news();
+        const auto gone = std::ranges::find_if(texts, [](const std::string& text) {
+            return text.starts_with("gone") && text.contains(" first");
+        });
+        const auto appeared = std::ranges::find(texts, "appeared second");
+        ASSERT_NE(gone, texts.end());
+        ASSERT_NE(appeared, texts.end());
+        if (isReused) {
+            EXPECT_LT(gone, appeared) << testing::PrintToString(texts);
+            return;
+        }
+        rename("second", "first");
+        (void)news();
+    }
+}
+
 TEST_P(StoreEventsTest, AFileThatWasMadeAndDeletedIsNotTold) {
     begin();
     write("passing");
