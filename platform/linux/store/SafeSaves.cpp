@@ -231,18 +231,33 @@ SafeSaves::Fate SafeSaves::fateWhenThere(const Vacancy& vacancy, RowNumber taker
 
 // All names of the row's file.
 void SafeSaves::setDocument(RowNumber number, std::uint32_t document) {
-    const Row& row = index_.row(number);
+    const Row row = index_.row(number);
     for (const RowNumber name : index_.rowsOfFile(row.fileID)) {
         const Row& other = index_.row(name);
-        if (other.birth == row.birth && other.fingerprint == row.fingerprint &&
-            other.document != document) {
+        if (areOneFile(other, row) && other.document != document) {
             index_.setDocument(name, document);
+            if (!other.has(Row::limbo)) {
+                changes_.changed(name);
+            }
+        }
+    }
+}
+
+// Of a file with several names, whoever knows one of them must hear that the identifier left it:
+// the name where it comes to rest may be hidden from him.
+void SafeSaves::noteLeft(std::uint32_t document) {
+    std::vector<RowNumber> names = index_.rowsOfDocument(document);
+    std::erase_if(names, [this](RowNumber name) { return index_.row(name).has(Row::limbo); });
+    if (names.size() > 1) {
+        for (const RowNumber name : names) {
+            changes_.documentLeft(name, document);
         }
     }
 }
 
 void SafeSaves::transfer(const Vacancy& vacancy, RowNumber taker, DeviceID device) {
     const std::uint32_t earlier = index_.row(taker).document;
+    noteLeft(vacancy.document);
     for (const RowNumber number : index_.rowsOfDocument(vacancy.document)) {
         index_.setDocument(number, 0);
         if (!index_.row(number).has(Row::limbo)) {
@@ -261,6 +276,10 @@ void SafeSaves::transfer(const Vacancy& vacancy, RowNumber taker, DeviceID devic
 void SafeSaves::exchange(const Vacancy& vacancy, RowNumber taker, RowNumber old, DeviceID device) {
     const std::uint32_t other = index_.row(taker).document;
     const CarriedAttributes others = index_.attributes(taker);
+    noteLeft(vacancy.document);
+    if (other != 0) {
+        noteLeft(other);
+    }
     setDocument(taker, 0);
     setDocument(old, other);
     setDocument(taker, vacancy.document);

@@ -110,6 +110,7 @@ class SafeSaves {
     [[nodiscard]] RowNumber placedRowOf(std::uint32_t document) const;
     void transfer(const Vacancy& vacancy, RowNumber taker, DeviceID device);
     void exchange(const Vacancy& vacancy, RowNumber taker, RowNumber old, DeviceID device);
+    void noteLeft(std::uint32_t document);
     void setDocument(RowNumber number, std::uint32_t document);
 
     Index& index_;

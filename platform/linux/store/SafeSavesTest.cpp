@@ -1,5 +1,9 @@
 // How long a name is waited for: the rest is tried on real files (SafeSaveTest.cpp).
 
+#include <string>
+#include <vector>
+
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "platform/linux/store/EntryMerger.h"
@@ -120,6 +124,29 @@ TEST_F(SafeSavesTest, AnotherFileOfThatNumberDoesNot) {
     other.status.birth = {99, 0};
     (void)merger_.merge(rootRow, "elsewhere", other);
     EXPECT_EQ(documentAt("elsewhere"), 0U);
+}
+
+// The name at which it comes to rest may be hidden from whoever knows another one.
+TEST_F(SafeSavesTest, ADocumentLeavesEachNameOfItsFile) {
+    EntryLook linked = look(10);
+    linked.status.linkCount = 2;
+    ASSERT_NE(merger_.merge(rootRow, "doc.bak", linked), noRow);
+    vanish("doc");
+    ASSERT_NE(merger_.merge(rootRow, "doc~", linked), noRow);
+    arriveBy("doc~", SafeSaves::Arrival::renamedWithin, "doc");
+    appear("doc", 11);
+    arriveBy("doc", SafeSaves::Arrival::made);
+    EXPECT_EQ(settleAt(std::chrono::seconds(100)).size(), 1U);
+    EXPECT_EQ(documentAt("doc"), document);
+    EventBatch batch;
+    changes_.flush(batch);
+    std::vector<std::string> left;
+    batch.forEach([&](const StoredEvent& event) {
+        if (event.goneDocument == DocumentID{document}) {
+            left.emplace_back(event.path);
+        }
+    });
+    EXPECT_THAT(left, testing::UnorderedElementsAre("doc.bak", "doc~"));
 }
 
 }  // namespace
