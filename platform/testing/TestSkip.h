@@ -15,6 +15,12 @@ namespace marrowdale {
     return value != nullptr && std::string_view(value) == "1";
 }
 
+#ifdef __has_feature
+inline constexpr bool isThreadSanitized = __has_feature(thread_sanitizer);
+#else
+inline constexpr bool isThreadSanitized = false;  // only clang builds with that sanitizer
+#endif
+
 [[nodiscard]] inline bool runsAsRoot() {
     return ::geteuid() == 0;
 }
@@ -33,3 +39,13 @@ namespace marrowdale {
 // Leaves the test because of the user who runs it: permissions don't bind root, and only root may
 // mount. The suite runs once as each, so nothing is lost and the skip is always allowed.
 #define MARROWDALE_SKIP_FOR_USER(reason) GTEST_SKIP() << "as this user: " << (reason)
+
+// Leaves the test where ThreadSanitizer is built in, for a reason that lies in how it works. The
+// suite runs without it and with the other sanitizers too, so nothing is lost and the skip is
+// always allowed.
+#define MARROWDALE_SKIP_UNDER_SANITIZER(reason)                    \
+    do {                                                           \
+        if (::marrowdale::isThreadSanitized) {                     \
+            GTEST_SKIP() << "under ThreadSanitizer: " << (reason); \
+        }                                                          \
+    } while (false)
