@@ -29,8 +29,9 @@ class ReplicaTest : public ::testing::Test {
     [[nodiscard]] std::vector<std::string> found(const std::vector<std::string>& words,
                                                  std::int64_t limit = 100) {
         std::vector<std::string> names;
-        for (const auto& found : replica_.search(words, limit).value()) {
-            names.push_back(found->filename);
+        const auto items = replica_.search(words, limit);
+        for (const auto& item : items.value()) {
+            names.push_back(item->filename);
         }
         return names;
     }

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <array>
+#include <cstddef>
 #include <cstdlib>
 #include <iostream>
 #include <memory>
@@ -46,14 +48,16 @@ enum class Following : std::uint8_t {
     restart,  // it is closed while things happen
 };
 
-// What runs only where MARROWDALE_STRESS is set: a writer and a recorder side by side are not the
-// same twice. Known: in about one of ten such runs the picture misses an entry or two, with
-// inotify, after a kill, and where folders are exchanged at full speed.
-inline std::vector<Following> byHand(const std::vector<Following>& ways) {
-    return std::getenv("MARROWDALE_STRESS") != nullptr ? ways : std::vector<Following>();
-}
+inline constexpr std::array byListening{Following::fanotify, Following::inotify};
+inline constexpr std::array everyWay{Following::fanotify, Following::inotify, Following::restart};
 
 using HistoryParameter = std::tuple<TestFileSystem, Following>;
+
+// Each file system with each of these ways.
+template <std::size_t count>
+auto followedBy(const std::array<Following, count>& ways) {
+    return testing::Combine(testing::ValuesIn(testFileSystems()), testing::ValuesIn(ways));
+}
 
 inline std::string historyParameterName(const testing::TestParamInfo<HistoryParameter>& info) {
     static constexpr std::array names{"fanotify", "inotify", "restart"};

@@ -19,10 +19,15 @@ bool isBelow(const std::string& path, const std::string& folder) {
     return path.size() > folder.size() && path.starts_with(folder) && path[folder.size()] == '/';
 }
 
+// 0 where nothing stands.
+std::uint64_t fileAt(const std::string& path) {
+    struct stat status{};
+    return ::lstat(path.c_str(), &status) == 0 ? status.st_ino : 0;
+}
+
 // Whether the file is still there under that name.
 bool stands(const Picture::Item& item) {
-    struct stat status{};
-    return ::lstat(item.path.c_str(), &status) == 0 && status.st_ino == item.fileID;
+    return fileAt(item.path) == item.fileID;
 }
 
 std::string describe(const std::string& identifier, const Picture::Item& item) {
@@ -69,8 +74,15 @@ Picture::Found Picture::walk(const std::string& folder) const {
     }
     Found found;
     for (const URL& url : urls) {
-        if (const auto item = LocalItem::initWithURL(world_->platform, url)) {
-            found.emplace_back(item->itemIdentifier, itemOf(*item));
+        // What goes meanwhile is told of; what takes its place is looked at once more, so that no
+        // identifier is kept with another file's number.
+        for (std::uint64_t file = fileAt(url.path()); file != 0;) {
+            const auto item = LocalItem::initWithURL(world_->platform, URL::fileURL(url.path()));
+            Item made = item ? itemOf(*item) : Item();
+            if (made.fileID == file) {
+                found.emplace_back(item->itemIdentifier, std::move(made));
+            }
+            file = made.fileID == file ? 0 : made.fileID;
         }
     }
     return found;
@@ -160,6 +172,11 @@ void Picture::fsEventReaderDidChangeItem(const std::shared_ptr<LocalItem>& item,
     if (item->fileURL.path() != world_->root()) {
         const auto known = items_.find(identifier);
         Item now = itemOf(*item);
+        if (event.fileID && now.fileID != raw(*event.fileID)) {
+            // The item is the event's file, which went after it was made.
+            now.fileID = raw(*event.fileID);
+            now.isFolder = item->isFolder() && identifier.starts_with("fid=");
+        }
         const bool moved =
             known != items_.end() && now.isFolder && known->second.front().path != now.path;
         if (moved) {

@@ -372,17 +372,8 @@ TEST_P(RecorderTest, WithoutMarksFoldersAreListedAgain) {
     EXPECT_EQ(WEXITSTATUS(end), 0);
 }
 
-INSTANTIATE_TEST_SUITE_P(OnEach, RecorderTest,
-                         testing::Combine(testing::ValuesIn(testFileSystems()),
-                                          testing::Values(Following::fanotify, Following::inotify)),
-                         historyParameterName);
-
-GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(StormTest);
-INSTANTIATE_TEST_SUITE_P(ByHand, StormTest,
-                         testing::Combine(testing::ValuesIn(testFileSystems()),
-                                          testing::ValuesIn(byHand({Following::fanotify,
-                                                                    Following::inotify}))),
-                         historyParameterName);
+INSTANTIATE_TEST_SUITE_P(OnEach, RecorderTest, followedBy(byListening), historyParameterName);
+INSTANTIATE_TEST_SUITE_P(OnEach, StormTest, followedBy(byListening), historyParameterName);
 
 }  // namespace
 }  // namespace marrowdale::tests
