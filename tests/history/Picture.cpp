@@ -15,10 +15,6 @@ namespace {
 
 constexpr std::size_t keptLines = 8;
 
-bool isBelow(const std::string& path, const std::string& folder) {
-    return path.size() > folder.size() && path.starts_with(folder) && path[folder.size()] == '/';
-}
-
 // 0 where nothing stands.
 std::uint64_t fileAt(const std::string& path) {
     struct stat status{};
@@ -49,6 +45,7 @@ void Picture::setWithin(std::function<void()> within) {
 Picture::Item Picture::itemOf(const LocalItem& item) {
     Item made;
     made.path = item.fileURL.path();
+    made.folder = fileAt(made.path.substr(0, made.path.rfind('/')));
     struct stat status{};
     if (::lstat(made.path.c_str(), &status) == 0) {
         made.fileID = status.st_ino;
@@ -128,7 +125,7 @@ void Picture::forget(const std::string& identifier) {
     items_.erase(known);
     for (const Item& name : names) {
         if (name.isFolder) {
-            forgetBelow(name.path);
+            forgetBelow(name.fileID);
         }
     }
 }
@@ -147,11 +144,20 @@ void Picture::forgetHidden(const std::string& identifier, const Item& item) {
     std::erase_if(items_, [](const auto& known) { return known.second.empty(); });
 }
 
-void Picture::forgetBelow(const std::string& folder) {
+void Picture::forgetBelow(std::uint64_t folder) {
+    std::vector<std::uint64_t> folders;
     for (auto& [identifier, names] : items_) {
-        std::erase_if(names, [&](const Item& name) { return isBelow(name.path, folder); });
+        std::erase_if(names, [&](const Item& name) {
+            if (name.folder == folder && name.isFolder) {
+                folders.push_back(name.fileID);
+            }
+            return name.folder == folder;
+        });
     }
     std::erase_if(items_, [](const auto& known) { return known.second.empty(); });
+    for (const std::uint64_t below : folders) {
+        forgetBelow(below);
+    }
 }
 
 void Picture::note(const std::string& line, const std::string& identifier) {
@@ -184,10 +190,11 @@ void Picture::fsEventReaderDidChangeItem(const std::shared_ptr<LocalItem>& item,
         }
         const bool rescans = now.isFolder && (moved || (event.flags & FileEventFlag::renamed) != 0);
         const std::string path = now.path;
+        const std::uint64_t file = now.fileID;
         forgetHidden(identifier, now);
         remember(identifier, std::move(now));
         if (rescans) {
-            forgetBelow(path);
+            forgetBelow(file);
             for (auto& [below, found] : walk(path)) {
                 remember(below, std::move(found));
             }

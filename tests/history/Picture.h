@@ -28,6 +28,7 @@ class Picture : public FSEventReaderDelegate {
     struct Item {
         std::string path;
         std::uint64_t fileID = 0;
+        std::uint64_t folder = 0;  // the file number of the one that it is in
         bool isFolder = false;
         // Of a file's contents, as they were when it was told of: size and date of change.
         std::uint64_t size = 0;
@@ -63,8 +64,9 @@ class Picture : public FSEventReaderDelegate {
     // A document that stood at the item's place, whose file's number the item was given, and that
     // went out of sight: to nobody's knowledge but the store's.
     void forgetHidden(const std::string& identifier, const Item& item);
-    // All names below the folder.
-    void forgetBelow(const std::string& folder);
+    // All that is in the folder of that file number, and below. Not by its path: another folder may
+    // be known there by now.
+    void forgetBelow(std::uint64_t folder);
     void note(const std::string& line, const std::string& identifier);
 
     mutable std::recursive_mutex mutex_;  // guards everything below
