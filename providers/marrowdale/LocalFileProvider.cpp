@@ -5,6 +5,7 @@
 
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
+#include "providers/marrowdale/fs/FSRetiredReaders.h"
 #include "providers/marrowdale/items/ItemForIdentifier.h"
 #include "providers/marrowdale/items/LocalItem.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
@@ -35,6 +36,10 @@ LocalFileProvider::LocalFileProvider(const Platform& platform) : platform_(platf
     });
     platform_.manager.signalEnumeratorForContainerItemIdentifier(
         VantrelWorkingSetContainerItemIdentifier, {});
+}
+
+LocalFileProvider::~LocalFileProvider() {
+    FSRetiredReaders::of(platform_).waitUntilGone();
 }
 
 std::optional<URL> LocalFileProvider::URLForItemWithPersistentIdentifier(

@@ -19,6 +19,11 @@ class LocalFileProvider : public FileProviderExtension {
     // Asks the host to read the working set again, for what changed while nothing ran. The platform
     // lives longer than the provider and all that it hands out.
     explicit LocalFileProvider(const Platform& platform);
+    LocalFileProvider(const LocalFileProvider&) = delete;
+    LocalFileProvider& operator=(const LocalFileProvider&) = delete;
+    // Waits for what enumerators that are gone left behind on queues, so that nothing of this
+    // module runs any more. The host has released its enumerators.
+    ~LocalFileProvider() override;
 
     std::optional<URL> URLForItemWithPersistentIdentifier(
         std::string_view itemIdentifier) noexcept override;
@@ -26,6 +31,7 @@ class LocalFileProvider : public FileProviderExtension {
     // The host framework's error for an item that does not exist.
     Expected<FileProviderItemPtr> itemForIdentifier(
         std::string_view itemIdentifier) noexcept override;
+    // The enumerator owns its notifier, which is bound to it for as long as it lives.
     Expected<std::unique_ptr<FileProviderEnumerator>> enumeratorForContainerItemIdentifier(
         std::string_view containerItemIdentifier) noexcept override;
 

@@ -69,22 +69,20 @@ Expected<DocumentID> Store::Core::documentAt(const std::string& path,
     return request->document;
 }
 
-// As in giving one out: what was told of the entry meanwhile says more than a look at it.
+// A look is merged only where the entry is not known as it stands: a document whose file is the one
+// that stands there is noted already.
 Expected<DocumentID> Store::Core::lookUpDocument(Request& request) {
     std::vector<std::size_t> unknown;
     const std::span<Request> requests(&request, 1);
-    auto folderKnown = fillKnown(requests, unknown);
-    if (folderKnown && !unknown.empty()) {
-        if (auto allowed = refuseForeign(requests, unknown); !allowed) {
-            return Unexpected(allowed.error());
-        }
-        if (auto done = lookForMissing(); !done) {
-            return Unexpected(done.error());
-        }
-        folderKnown = fillKnown(requests, unknown);
+    request.document = knownDocumentID(request.status);
+    if (request.document != DocumentID{}) {
+        return request.document;
     }
-    if (!folderKnown) {
+    if (const auto folderKnown = fillKnown(requests, unknown); !folderKnown) {
         return Unexpected(folderKnown.error());
+    }
+    if (auto allowed = refuseForeign(requests, unknown); !allowed) {
+        return Unexpected(allowed.error());
     }
     if (!unknown.empty()) {
         const auto looked = lookAtEntries(requests, unknown);

@@ -11,10 +11,7 @@ FSRetiredReaders& FSRetiredReaders::of(const Platform& platform) {
 }
 
 void FSRetiredReaders::retire(std::shared_ptr<FSEventReader> reader) {
-    {
-        const MutexLock lock(mutex_);
-        ++count_;
-    }
+    retired_.enter();
     const SerialQueue queue = reader->streamQueue();
     queue.async([this, reader = std::move(reader)]() mutable {
         reader->stop();
@@ -25,17 +22,12 @@ void FSRetiredReaders::retire(std::shared_ptr<FSEventReader> reader) {
 void FSRetiredReaders::release(std::shared_ptr<FSEventReader> reader) {
     queue_.async([this, reader = std::move(reader)]() mutable {
         reader.reset();
-        const MutexLock lock(mutex_);
-        --count_;
-        gone_.notifyAll();
+        retired_.leave();
     });
 }
 
 void FSRetiredReaders::waitUntilGone() {
-    MutexLock lock(mutex_);
-    while (count_ > 0) {
-        gone_.wait(lock);
-    }
+    retired_.wait();
 }
 
 }  // namespace marrowdale

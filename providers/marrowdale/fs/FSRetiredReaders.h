@@ -1,10 +1,9 @@
 #pragma once
 
-#include <cstddef>
 #include <memory>
 
 #include "platform/Platform.h"
-#include "platform/foundation/Mutex.h"
+#include "platform/foundation/Semaphore.h"
 #include "platform/foundation/SerialQueue.h"
 
 namespace marrowdale {
@@ -35,9 +34,7 @@ class FSRetiredReaders {
   private:
     void release(std::shared_ptr<FSEventReader> reader);
 
-    Mutex mutex_;
-    Condition gone_;
-    std::size_t count_ MARROWDALE_GUARDED_BY(mutex_) = 0;  // retired and not gone
+    WorkGroup retired_;  // and not gone
     const SerialQueue queue_{"marrowdale.retired-readers"};
 };
 
