@@ -21,9 +21,11 @@ bool isMoveToHere(const FileEvent& event) {
     return says(event, FileEventFlag::renamed) && !says(event, FileEventFlag::gone);
 }
 
-// An event may tell of a change or a deletion, and then of its document's deletion.
-bool mayTellOfDocumentToo(const FileEvent& event) {
-    return says(event, FileEventFlag::gone) && event.goneDocument != DocumentID{};
+// The event of an update may tell of a document's deletion too, right after it.
+bool mayTellOfDocumentToo(const LocalItem& item, const FileEvent& event) {
+    const bool isDocumentGone =
+        says(event, FileEventFlag::gone) && event.goneDocument != DocumentID{};
+    return isDocumentGone || (item.isFolder() && isMoveToHere(event));
 }
 
 }  // namespace
@@ -99,7 +101,7 @@ void FSChangesEnumerator::fsEventReaderDidChangeItem(const std::shared_ptr<Local
     if (isScanned(*item, event)) {
         tellFolder(item, event);
     } else if (forwardUpdate(item, event) == Batch::full) {
-        finishEarly(event, mayTellOfDocumentToo(event) ? Told::inPart : Told::whole);
+        finishEarly(event, mayTellOfDocumentToo(*item, event) ? Told::inPart : Told::whole);
     }
 }
 

@@ -33,6 +33,10 @@ enum class FSEventReaderMode : std::uint8_t {
 // numbers of files are given out again. A path is hidden when a component of it below the monitored
 // folder begins with "."; what is hidden, or outside all monitored folders, is never told.
 //
+// Two things are gone to those who know them though their file is not, and are told as deletions of
+// their documents, besides what the event of their old place tells: what was moved to where it is
+// hidden or not monitored, and a package that was renamed and is an ordinary folder now.
+//
 // An event of the feed of documents is told as a change of the item that holds the document now,
 // wherever that is; so it runs through the same looks (hidden, monitored, present, servable) with
 // the path that was found, and the file that the event names is not compared: the document may have
@@ -132,6 +136,10 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
     [[nodiscard]] bool handleItem(const Run& run, FSEventReaderDelegate& delegate,
                                   const FileEvent& event, const URL& url,
                                   std::optional<FileID> otherFile) const;
+    [[nodiscard]] bool tellOutOfSight(const Run& run, FSEventReaderDelegate& delegate,
+                                      const FileEvent& event, const URL& url) const;
+    [[nodiscard]] bool tellDocumentAt(const Run& run, FSEventReaderDelegate& delegate,
+                                      const FileEvent& event, const URL& url) const;
     [[nodiscard]] bool tellDeletions(const Run& run, FSEventReaderDelegate& delegate,
                                      const FileEvent& event, const URL& url) const;
     // False when the reader was stopped before.

@@ -24,6 +24,10 @@ bool says(const FileEvent& event, std::uint32_t flags) {
     return (event.flags & flags) != 0;
 }
 
+bool isMoveToHere(const FileEvent& event) {
+    return says(event, FileEventFlag::renamed) && !says(event, FileEventFlag::gone);
+}
+
 bool saysDropped(const FileEvent& event) {
     return says(event, FileEventFlag::userDropped | FileEventFlag::kernelDropped);
 }
@@ -160,11 +164,11 @@ bool FSEventReader::handleURL(const Run& run, FSEventReaderDelegate& delegate,
     switch (placeOf(url)) {
         case Place::hidden:
             logDecision([&] { return "dropping fsevent at " + url.path() + "; URL is hidden"; });
-            return true;
+            return tellOutOfSight(run, delegate, event, url);
         case Place::notMonitored:
             logDecision(
                 [&] { return "dropping fsevent at " + url.path() + "; URL is not monitored"; });
-            return true;
+            return tellOutOfSight(run, delegate, event, url);
         case Place::visible:
             break;
     }
@@ -185,6 +189,9 @@ bool FSEventReader::handleItem(const Run& run, FSEventReaderDelegate& delegate,
     if (item && !otherFile) {
         logDecision([&] { return "did change " + item->description(); });
         delegate.fsEventReaderDidChangeItem(item, event);
+        if (item->isFolder() && isMoveToHere(event) && !tellDocumentAt(run, delegate, event, url)) {
+            return false;
+        }
         // An identifier that went, from a file that stays under another, or from one whose number
         // the file that stands here was given.
         const bool isIdentifierGone = says(event, FileEventFlag::gone) &&
@@ -203,6 +210,30 @@ bool FSEventReader::handleItem(const Run& run, FSEventReaderDelegate& delegate,
     // Its own file left this place all the same.
     const bool isGone = otherFile && says(event, FileEventFlag::gone);
     return !isGone || tellDeletions(run, delegate, event, url);
+}
+
+// Whoever knows the document need not recognise it in the number of the file that the event of its
+// old place has: a link is known with the number of what it leads to, and a document that came to
+// rest on another file with that of the one before. A file of several names may be in sight under
+// another one, which its number tells as well.
+bool FSEventReader::tellOutOfSight(const Run& run, FSEventReaderDelegate& delegate,
+                                   const FileEvent& event, const URL& url) const {
+    if (!isMoveToHere(event)) {
+        return true;
+    }
+    const auto status = platform_.fileSystem.status(url);
+    const bool hasOtherNames =
+        status && status->fileID == event.fileID && !status->isDirectory && status->linkCount > 1;
+    return hasOtherNames || tellDocumentAt(run, delegate, event, url);
+}
+
+// What stands there is no document to anybody any more, though its number stays with it.
+bool FSEventReader::tellDocumentAt(const Run& run, FSEventReaderDelegate& delegate,
+                                   const FileEvent& event, const URL& url) const {
+    const auto document =
+        platform_.generationStore.permanentStorageForItemAtURL(url, AllocateIfNone::no);
+    return !document || tellDeletion(run, delegate, event, url,
+                                     MRWFileObjectIdentifier::fromDocumentID(raw(*document)));
 }
 
 bool FSEventReader::tellDeletions(const Run& run, FSEventReaderDelegate& delegate,
