@@ -13,8 +13,8 @@ namespace marrowdale::tests {
 // A step that fails, because what it needs is not there, is part of the game: nothing here looks at
 // what calls answer.
 
-RandomWriter::RandomWriter(std::string root, std::uint32_t seed)
-    : root_(std::move(root)), linked_(root_ + "-linked"), random_(seed) {
+RandomWriter::RandomWriter(std::string root, std::uint32_t seed, HardLinks hardLinks)
+    : root_(std::move(root)), linked_(root_ + "-linked"), hardLinks_(hardLinks), random_(seed) {
     write(linked_);
 }
 
@@ -144,7 +144,9 @@ void RandomWriter::step() {
             rename(folder(), folder(), RENAME_EXCHANGE);
             break;
         case 17:
-            (void)::link(file().c_str(), file().c_str());
+            if (hardLinks_ == HardLinks::made) {
+                (void)::link(file().c_str(), file().c_str());
+            }
             break;
         case 18:
             if (const std::string tree = folder(); tree != root_ && upTo(3) == 0) {

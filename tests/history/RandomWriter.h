@@ -6,13 +6,16 @@
 
 namespace marrowdale::tests {
 
+enum class HardLinks : std::uint8_t { leftOut, made };
+
 // Does to a tree what programs and people do, at random: files, folders, renames, moves, hard
 // links, safe saves, deletes of trees, hidden names, packages, exchanges, links, metadata. Names
 // are few, so that they meet; what a step needs and does not find, it leaves undone. One thread.
 class RandomWriter {
   public:
-    // Makes a file beside the root too, for links to lead to.
-    RandomWriter(std::string root, std::uint32_t seed);
+    // Makes a file beside the root too, for links to lead to. `hardLinks`: whether files get
+    // further names that stay; a safe save uses one for a moment anyway.
+    RandomWriter(std::string root, std::uint32_t seed, HardLinks hardLinks = HardLinks::made);
 
     void step();
     void steps(int count) {
@@ -34,6 +37,7 @@ class RandomWriter {
 
     const std::string root_;
     const std::string linked_;
+    const HardLinks hardLinks_;
     std::mt19937 random_;
 };
 
