@@ -123,6 +123,7 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
     // What happens to events: FSEventReaderEvents.cpp. Each handler answers whether the event was
     // handled to its end; false when the reader was stopped before that.
     void handleBatch(const Run& run, std::span<const FileEvent> events);
+    void allocateDocuments(std::span<const FileEvent> events) const;
     void countAsProcessed(EventID eventID);
     [[nodiscard]] bool handle(const Run& run, FSEventReaderDelegate& delegate,
                               const FileEvent& event) const;

@@ -72,6 +72,9 @@ std::shared_ptr<LocalItem> makeItem(const Platform& platform, const URL& url) {
 
 void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> events) {
     logDecision([&] { return "fsevent: received " + std::to_string(events.size()) + " events"; });
+    if (delegate_.lock() && !run.isStopped) {
+        allocateDocuments(events);
+    }
     for (const FileEvent& event : events) {
         const auto delegate = delegate_.lock();
         if (!delegate || run.isStopped) {
@@ -88,6 +91,23 @@ void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> event
         if (!says(event, FileEventFlag::eventIDsWrapped)) {
             countAsProcessed(event.id);
         }
+    }
+}
+
+// All at once, because each would cost a sync of the disk. What fails here fails, and is told,
+// where the item is made.
+void FSEventReader::allocateDocuments(std::span<const FileEvent> events) const {
+    std::vector<std::string> paths;
+    for (const FileEvent& event : events) {
+        const bool isOfFile = event.path && !event.path->empty() &&
+                              !says(event, FileEventFlag::gone | FileEventFlag::isFolder |
+                                               FileEventFlag::documentMoved);
+        if (isOfFile && placeOf(URL::fileURL(*event.path)) == Place::visible) {
+            paths.push_back(*event.path);
+        }
+    }
+    if (paths.size() > 1) {
+        (void)platform_.generationStore.allocatePermanentStorage(paths);
     }
 }
 
