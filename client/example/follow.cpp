@@ -9,6 +9,7 @@
 #include <map>
 #include <marrowdale/client.h>
 #include <string>
+#include <vector>
 
 namespace client = marrowdale::client;
 
@@ -75,17 +76,26 @@ class Picture {
         return {};
     }
 
-    // A deleted "fid=N" also means the item that is known by that file number.
+    // A deleted "fid=N" also means the item that is known by that file number, and with a folder
+    // goes what is known in it.
     void remove(const std::string& identifier) {
+        std::vector<std::string> folders;
         std::erase_if(items_, [&](const auto& entry) {
             const client::Item& item = entry.second;
-            const bool isIt = item.itemIdentifier == identifier ||
-                              (item.fileID && "fid=" + std::to_string(*item.fileID) == identifier);
-            if (isIt) {
+            const bool isGone =
+                item.itemIdentifier == identifier || item.parentItemIdentifier == identifier ||
+                (item.fileID && "fid=" + std::to_string(*item.fileID) == identifier);
+            if (isGone) {
                 std::cout << "gone " << item.path << '\n';
             }
-            return isIt;
+            if (isGone && item.isFolder && item.itemIdentifier != identifier) {
+                folders.push_back(item.itemIdentifier);
+            }
+            return isGone;
         });
+        for (const std::string& folder : folders) {
+            remove(folder);
+        }
     }
 
     std::map<std::string, client::Item> items_;

@@ -12,14 +12,16 @@ namespace marrowdale::host {
 
 namespace {
 
-constexpr std::int64_t formatVersion = 1;
+constexpr std::int64_t formatVersion = 2;
 
 // The index holds three letters of every name and tag at each place, so that any part of three
 // letters or more is found without reading all names.
 constexpr const char* tables = R"(
 CREATE TABLE items (
-    number INTEGER PRIMARY KEY, identifier TEXT UNIQUE NOT NULL, file INTEGER, domain TEXT,
+    number INTEGER PRIMARY KEY, identifier TEXT UNIQUE NOT NULL, parent TEXT NOT NULL,
+    file INTEGER, domain TEXT,
     name TEXT NOT NULL, tags TEXT NOT NULL, item TEXT NOT NULL);
+CREATE INDEX items_by_parent ON items (parent);
 CREATE INDEX items_by_file ON items (file);
 CREATE INDEX items_by_domain ON items (domain) WHERE domain IS NOT NULL;
 CREATE VIRTUAL TABLE names USING fts5(name, tags, content='items', content_rowid='number',
@@ -31,7 +33,7 @@ CREATE TRIGGER items_removed AFTER DELETE ON items BEGIN
     INSERT INTO names(names, rowid, name, tags) VALUES ('delete', old.number, old.name, old.tags);
 END;
 CREATE TABLE state (anchor TEXT);
-PRAGMA user_version=1;
+PRAGMA user_version=2;
 )";
 
 constexpr std::size_t shortestIndexed = 3;
@@ -208,24 +210,25 @@ Expected<void> Replica::put(const FileProviderItem& item) {
         return removed;
     }
     auto statement = database_.prepare(
-        "INSERT INTO items (identifier, file, domain, name, tags, item) VALUES (?,?,?,?,?,?)");
+        "INSERT INTO items (identifier, parent, file, domain, name, tags, item) "
+        "VALUES (?,?,?,?,?,?,?)");
     if (!statement) {
         return Unexpected(statement.error());
     }
-    statement->bind(1, item.itemIdentifier);
+    statement->bind(1, item.itemIdentifier).bind(2, item.parentItemIdentifier);
     if (item.fileID) {
-        statement->bind(2, static_cast<std::int64_t>(*item.fileID));
-    } else {
-        statement->bindNull(2);
-    }
-    if (item.hx_appContainerBundleIdentifier) {
-        statement->bind(3, "#" + *item.hx_appContainerBundleIdentifier);
+        statement->bind(3, static_cast<std::int64_t>(*item.fileID));
     } else {
         statement->bindNull(3);
     }
-    return statement->bind(4, item.filename)
-        .bind(5, joinedTags(item))
-        .bind(6, itemJson(item))
+    if (item.hx_appContainerBundleIdentifier) {
+        statement->bind(4, "#" + *item.hx_appContainerBundleIdentifier);
+    } else {
+        statement->bindNull(4);
+    }
+    return statement->bind(5, item.filename)
+        .bind(6, joinedTags(item))
+        .bind(7, itemJson(item))
         .run();
 }
 
@@ -236,6 +239,25 @@ Expected<void> Replica::removeWhere(const std::string& condition, std::string_vi
 
 Expected<void> Replica::remove(std::string_view identifier) {
     return removeWhere("identifier = ?", identifier);
+}
+
+// With a folder goes what is known in it; "fid=N" also means the item of that file number.
+Expected<void> Replica::removeTree(std::string_view identifier) {
+    auto statement = database_.prepare(
+        "WITH RECURSIVE gone(identifier) AS ("
+        "SELECT identifier FROM items WHERE identifier = ?1 OR file = ?2 "
+        "UNION SELECT items.identifier FROM items JOIN gone ON items.parent = gone.identifier) "
+        "DELETE FROM items WHERE identifier IN gone");
+    if (!statement) {
+        return Unexpected(statement.error());
+    }
+    statement->bind(1, identifier);
+    if (const auto number = fileNumber(identifier)) {
+        statement->bind(2, *number);
+    } else {
+        statement->bindNull(2);
+    }
+    return statement->run();
 }
 
 Expected<void> Replica::add(std::span<const FileProviderItemPtr> items) {
@@ -252,17 +274,8 @@ Expected<void> Replica::add(std::span<const FileProviderItemPtr> items) {
 Expected<void> Replica::apply(const ItemChanges& changes) {
     return inTransaction([&]() -> Expected<void> {
         for (const std::string& identifier : changes.deleted) {
-            if (auto removed = remove(identifier); !removed) {
+            if (auto removed = removeTree(identifier); !removed) {
                 return removed;
-            }
-            if (const auto number = fileNumber(identifier)) {
-                auto statement = database_.prepare("DELETE FROM items WHERE file = ?");
-                if (!statement) {
-                    return Unexpected(statement.error());
-                }
-                if (auto removed = statement->bind(1, *number).run(); !removed) {
-                    return removed;
-                }
             }
         }
         for (const auto& item : changes.updated) {

@@ -48,6 +48,7 @@ class Replica {
     Expected<void> inTransaction(const Work& work);
     [[nodiscard]] Expected<void> put(const FileProviderItem& item);
     [[nodiscard]] Expected<void> remove(std::string_view identifier);
+    [[nodiscard]] Expected<void> removeTree(std::string_view identifier);
     [[nodiscard]] Expected<void> removeWhere(const std::string& condition, std::string_view value);
     [[nodiscard]] Expected<void> writeAnchor(const Data& anchor);
 

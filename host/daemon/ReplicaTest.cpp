@@ -76,6 +76,20 @@ TEST_F(ReplicaTest, aDeletedFileNumberTakesTheItemOfThatNumber) {
     EXPECT_THAT(found({}), ElementsAre("two"));
 }
 
+TEST_F(ReplicaTest, aDeletedFolderTakesWhatIsInIt) {
+    auto folder = item("fid=1", "folder", 1);
+    auto inner = item("fid=2", "inner", 2);
+    inner->parentItemIdentifier = "fid=1";
+    auto document = item("did=3", "document", 3);
+    document->parentItemIdentifier = "fid=2";
+    auto moved = item("did=4", "moved", 4);
+    moved->parentItemIdentifier = "fid=2";
+    add({folder, inner, document, moved, item("did=5", "other", 5)});
+    ASSERT_TRUE(replica_.apply({{item("did=4", "moved", 4)}, {"fid=1"}, Data::fromText("a"), {}})
+                    .has_value());
+    EXPECT_THAT(found({}), ElementsAre("moved", "other"));
+}
+
 TEST_F(ReplicaTest, aDomainGoesWithItsItems) {
     const std::vector<std::string> domains{"#org.example.A"};
     auto library = item("#org.example.A", "A", 1);

@@ -77,7 +77,7 @@ struct Page {
 };
 
 // What changed since an anchor. Apply `deleted` first, then `updated`; a deleted "fid=N" also means
-// the item that is known by `fileID` N.
+// the item that is known by `fileID` N, and with a folder goes everything that is known in it.
 struct Changes {
     std::vector<Item> updated;
     std::vector<std::string> deleted;

@@ -103,16 +103,28 @@ void EntryMerger::refresh(RowNumber number, const EntryLook& look) {
     }
 }
 
-void EntryMerger::makeSure(RowNumber number, const EntryLook& look) {
+bool EntryMerger::confirm(RowNumber number, const EntryLook& look) {
     Row& row = index_.row(number);
+    if (row.isFree() || row.has(Row::limbo) || !isSameFile(row, look, true)) {
+        return false;
+    }
+    const Row values = valuesOf(look);
+    if (row.changed != values.changed || (!row.isFolder() && row.size != values.size)) {
+        return false;
+    }
+    if (row.has(Row::unsure) != values.has(Row::unsure)) {
+        row.set(Row::unsure, values.has(Row::unsure));
+        index_.markDirty(number);
+    }
+    return true;
+}
+
+void EntryMerger::makeSure(RowNumber number, const EntryLook& look) {
+    const Row& row = index_.row(number);
     if (row.isFree() || row.has(Row::limbo) || !isSameFile(row, look, true)) {
         return;  // the next look finds what became of it
     }
-    const Row values = valuesOf(look);
-    if (row.changed == values.changed && (row.isFolder() || row.size == values.size)) {
-        row.set(Row::unsure, values.has(Row::unsure));
-        index_.markDirty(number);
-    } else {
+    if (!confirm(number, look)) {
         refresh(number, look);
     }
 }

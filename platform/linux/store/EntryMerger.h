@@ -49,6 +49,10 @@ class EntryMerger {
 
     // The file of that row was changed, as this look shows.
     void noteChanged(RowNumber number, const EntryLook& look) { refresh(number, look); }
+    // True when the row's file is the one that was found and shows no change: then a row that was
+    // unsure is as sure as this look. For looks that nobody was told to make; where a watcher tells
+    // of a change, a time that is the same proves nothing.
+    [[nodiscard]] bool confirm(RowNumber number, const EntryLook& look);
     // A second look, when enough time has passed to be sure of the first.
     void makeSure(RowNumber number, const EntryLook& look);
 

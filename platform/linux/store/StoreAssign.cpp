@@ -200,8 +200,13 @@ RowNumber Store::Core::rowOf(const Request& request) {
 RowNumber Store::Core::rowOfLook(const Request& request, const Looked& looked) {
     const RowNumber parent = folderRow(request.folder);
     if (looked.stands && parent != noRow) {
-        const RowNumber row =
-            EntryMerger(index_, changes_, saves_).merge(parent, request.name, looked.look);
+        EntryMerger merger(index_, changes_, saves_);
+        // What happens to the file is told by the watcher, where there is one.
+        const RowNumber known = watcher_ ? index_.child(parent, request.name) : noRow;
+        if (known != noRow && merger.confirm(known, looked.look)) {
+            return known;
+        }
+        const RowNumber row = merger.merge(parent, request.name, looked.look);
         if (row != noRow) {
             return row;
         }
