@@ -37,9 +37,20 @@ void ChangesCollector::didDeleteItemsWithIdentifiers(std::vector<std::string> id
         const auto number = fileIDOf(identifier);
         const auto known = number ? identifiersByFileID_.find(*number) : identifiersByFileID_.end();
         if (known != identifiersByFileID_.end()) {
-            tell(known->second, nullptr);
+            forget(std::string(known->second));
         }
-        tell(identifier, nullptr);
+        forget(identifier);
+    }
+}
+
+void ChangesCollector::forget(const std::string& identifier) {
+    tell(identifier, nullptr);
+    // An answer is a few hundred words long at most.
+    for (std::size_t at = 0; at < words_.size(); ++at) {
+        const Word& word = words_[at];
+        if (word.item && !word.isStale && word.item->parentItemIdentifier == identifier) {
+            forget(std::string(word.identifier));
+        }
     }
 }
 

@@ -22,6 +22,8 @@ class ChangesCollector final : public FileProviderChangeObserver {
     [[nodiscard]] Expected<ItemChanges> wait();
 
   private:
+    // A deletion, with what was told to be in it.
+    void forget(const std::string& identifier);
     // An identifier's last word: the item as it is, or null for a deletion.
     void tell(const std::string& identifier, FileProviderItemPtr item);
     [[nodiscard]] ItemChanges gathered() const;

@@ -51,6 +51,24 @@ TEST(ChangesCollectorTest, aDeletedFileNumberTakesTheItemOfThatNumberBack) {
     EXPECT_THAT(changes->deleted, ElementsAre("did=1", "fid=7"));
 }
 
+TEST(ChangesCollectorTest, aDeletedFolderTakesBackWhatWasToldToBeInIt) {
+    const auto in = [](std::string_view parent, std::string_view identifier, std::uint64_t file) {
+        auto item = std::make_shared<FakeItem>(identifier);
+        item->fileID = file;
+        item->parentItemIdentifier = parent;
+        return item;
+    };
+    ChangesCollector collector;
+    collector.didUpdateItems(
+        {in("fid=1", "fid=2", 2), in("fid=2", "did=3", 3), in("x", "did=4", 4)});
+    collector.didDeleteItemsWithIdentifiers({"fid=1"});
+    collector.didUpdateItems({in("x", "did=3", 3)});
+    collector.finishEnumeratingChangesUpToSyncAnchor({}, MoreComing::no);
+    const auto changes = collector.wait();
+    EXPECT_THAT(identifiers(changes->updated), ElementsAre("did=4", "did=3"));
+    EXPECT_THAT(changes->deleted, ElementsAre("fid=1", "fid=2"));
+}
+
 TEST(ChangesCollectorTest, anErrorIsTheAnswerWhateverCameBefore) {
     ChangesCollector collector;
     collector.didUpdateItems({item("did=1", 7)});
