@@ -32,6 +32,7 @@ LAYERS = {
     "platform/SharedObjects.h": [],
     "providers/marrowdale/items": INTERFACES,
     "providers/marrowdale/fs": INTERFACES + ITEMS,
+    "providers/marrowdale/actions": INTERFACES + ITEMS + ["providers/marrowdale/fs"],
     "providers/marrowdale": INTERFACES + EXTENSION,
     "platform/linux/files": ["platform/foundation", "platform/services"],
     "platform/linux/events": ["platform/foundation", "platform/services"] + FILES,
@@ -39,6 +40,8 @@ LAYERS = {
                             + ["platform/linux/events"],
     "platform/linux/streams": ["platform/foundation", "platform/services"] + FILES
                               + ["platform/linux/store"],
+    "platform/linux/operations": ["platform/foundation", "platform/services"] + FILES
+                                 + ["platform/linux/store"],
     "platform/linux/applications": ["platform/foundation", "platform/services"] + FILES,
     # The module is reached through its entry point, so the host knows the extension's interfaces
     # and never its classes. The codes of its errors are part of what it answers.
