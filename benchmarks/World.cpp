@@ -11,6 +11,7 @@
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/operations/LinuxFileOperations.h"
 #include "platform/linux/streams/LinuxFileEvents.h"
 #include "providers/marrowdale/LocalFileProvider.h"
 
@@ -74,6 +75,14 @@ std::unique_ptr<native::Store> openedStore(const std::string& root, const std::s
     return std::move(*store);
 }
 
+std::unique_ptr<native::Temporaries> openedTemporaries(const std::string& state) {
+    auto temporaries = native::Temporaries::open(state, nullptr);
+    if (!temporaries) {
+        throw std::runtime_error(temporaries.error().description());
+    }
+    return std::move(*temporaries);
+}
+
 }  // namespace
 
 class World::Parts {
@@ -81,6 +90,7 @@ class World::Parts {
     Parts(const std::string& root, const std::string& state)
         : store(openedStore(root, state)),
           trees({root}, {state, state + "/cache"}),
+          temporaries(openedTemporaries(state)),
           manager(URL::fileURL(root)) {}
 
     std::unique_ptr<native::Store> store;
@@ -101,6 +111,8 @@ class World::Parts {
                                                            .work = sharedWork}};
     native::LinuxExtendedAttributes extendedAttributes{attributeCalls, trees};
     native::LinuxWriteAccess writeAccess{trees};
+    std::unique_ptr<native::Temporaries> temporaries;
+    native::LinuxFileOperations fileOperations{{trees, packages, *temporaries}, &log};
     native::NoApplications applications;
     Manager manager;
     SharedObjects shared;
@@ -108,6 +120,7 @@ class World::Parts {
                       .fileSystem = fileSystem,
                       .extendedAttributes = extendedAttributes,
                       .writeAccess = writeAccess,
+                      .fileOperations = fileOperations,
                       .generationStore = *store,
                       .fileEvents = fileEvents,
                       .applications = applications,

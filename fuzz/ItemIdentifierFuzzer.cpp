@@ -43,9 +43,9 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* bytes, std::size_t siz
     fake.fileSystem.pathAnswer = [](marrowdale::DeviceID, marrowdale::FileID file) {
         return marrowdale::Expected<std::string>("/storage/" + std::to_string(raw(file)));
     };
-    const marrowdale::Platform platform{fake.log,          fake.fileSystem, fake.attributes,
-                                        fake.writeAccess,  documents,       fake.events,
-                                        fake.applications, fake.manager,    fake.shared};
+    const marrowdale::Platform platform{
+        fake.log,  fake.fileSystem, fake.attributes,   fake.writeAccess, fake.fileOperations,
+        documents, fake.events,     fake.applications, fake.manager,     fake.shared};
     const auto url = marrowdale::fileURLWithItemIdentifier(platform, text);
     if (url && text.starts_with("did=")) {
         // The number in the place is the one in the text, with nothing cut off its front.

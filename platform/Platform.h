@@ -6,6 +6,7 @@
 #include "platform/services/ApplicationRegistry.h"
 #include "platform/services/ExtendedAttributes.h"
 #include "platform/services/FileEventService.h"
+#include "platform/services/FileOperations.h"
 #include "platform/services/FileSystem.h"
 #include "platform/services/GenerationStore.h"
 
@@ -19,6 +20,7 @@ struct Platform {
     FileSystem& fileSystem;
     ExtendedAttributes& extendedAttributes;
     WriteAccess& writeAccess;
+    FileOperations& fileOperations;
     GenerationStore& generationStore;
     FileEventService& fileEvents;
     ApplicationRegistry& applications;

@@ -15,6 +15,7 @@
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/operations/LinuxFileOperations.h"
 #include "platform/linux/store/Store.h"
 #include "platform/linux/streams/LinuxFileEvents.h"
 
@@ -23,10 +24,12 @@ namespace marrowdale::host {
 // Members in the order in which they need each other; they go in the reverse order.
 class World::Parts {
   public:
-    Parts(WorldOptions options, std::unique_ptr<Log> log, std::unique_ptr<native::Store> store)
+    Parts(WorldOptions options, std::unique_ptr<Log> log, std::unique_ptr<native::Store> store,
+          std::unique_ptr<native::Temporaries> temporaries)
         : options_(std::move(options)),
           log_(std::move(log)),
           store_(std::move(store)),
+          temporaries_(std::move(temporaries)),
           fileEvents_(*store_, log_.get()),
           trees_({options_.settings.rootPath},
                  {options_.settings.stateFolder, options_.settings.cacheFolder}),
@@ -39,11 +42,13 @@ class World::Parts {
                        .work = sharedWork_}),
           extendedAttributes_(attributeCalls_, trees_),
           writeAccess_(trees_),
+          fileOperations_({trees_, packages_, *temporaries_}, log_.get()),
           manager_(options_.settings.rootPath),
           platform_{.log = *log_,
                     .fileSystem = fileSystem_,
                     .extendedAttributes = extendedAttributes_,
                     .writeAccess = writeAccess_,
+                    .fileOperations = fileOperations_,
                     .generationStore = *store_,
                     .fileEvents = fileEvents_,
                     .applications = applications_,
@@ -52,6 +57,7 @@ class World::Parts {
 
     ~Parts() {
         // Handlers refer to the extension.
+        fileOperations_.finish();
         manager_.finishHandlers();
         requests_.reset();
         extension_.reset();
@@ -75,6 +81,7 @@ class World::Parts {
                           .signals = manager_.signals(),
                           .rootPath = options_.settings.rootPath,
                           .replicaPath = options_.settings.stateFolder + "/replica.sqlite",
+                          .stateFolder = options_.settings.stateFolder,
                           .findings = [this] { return findings(); }});
         return {};
     }
@@ -99,6 +106,7 @@ class World::Parts {
     WorldOptions options_;
     std::unique_ptr<Log> log_;
     std::unique_ptr<native::Store> store_;
+    std::unique_ptr<native::Temporaries> temporaries_;
     native::LinuxFileEvents fileEvents_;
     native::ServedTrees trees_;  // after the store, which makes the folders that are kept out
     native::MimeTypes types_;
@@ -109,6 +117,7 @@ class World::Parts {
     native::LinuxFileSystem fileSystem_;
     native::LinuxExtendedAttributes extendedAttributes_;
     native::LinuxWriteAccess writeAccess_;
+    native::LinuxFileOperations fileOperations_;
     native::NoApplications applications_;
     HostManager manager_;
     std::unique_ptr<ExtensionModule> module_;
@@ -177,7 +186,15 @@ Started<std::unique_ptr<World>> World::open(const WorldOptions& options) {
     if (!store) {
         return std::unexpected(openingFailed(std::move(store.error()), options.settings));
     }
-    auto parts = std::make_unique<Parts>(options, std::move(log), std::move(*store));
+    auto temporaries = native::Temporaries::open(options.settings.stateFolder, log.get());
+    if (!temporaries) {
+        return std::unexpected(StartFailure::from(std::move(temporaries.error())));
+    }
+    (*temporaries)->sweep([&](FileID folder) {
+        return (*store)->pathForFileID((*store)->device(), folder);
+    });
+    auto parts = std::make_unique<Parts>(options, std::move(log), std::move(*store),
+                                         std::move(*temporaries));
     if (auto loaded = parts->loadExtension(); !loaded) {
         return std::unexpected(std::move(loaded.error()));
     }

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <functional>
+#include <initializer_list>
 #include <map>
 #include <memory>
 #include <string>
@@ -169,6 +171,82 @@ class FakeExtension final : public FileProviderExtension {
     }
     void stopProvidingItemAtURL(const URL& /*url*/) override {}
     void itemChangedAtURL(const URL& /*url*/) override {}
+
+    // What was asked of it, a line each; answered with `actionError` or the item `actionItem`.
+    std::vector<std::string> actions;
+    std::optional<Error> actionError;
+    std::string actionItem;
+
+    void importDocumentAtURL(const URL& url, std::string_view toParentItemIdentifier,
+                             ItemCompletionHandler handler) override {
+        act({"import", url.path(), toParentItemIdentifier}, handler);
+    }
+    void createDirectoryWithName(std::string_view name, std::string_view inParentItemIdentifier,
+                                 ItemCompletionHandler handler) override {
+        act({"create", name, inParentItemIdentifier}, handler);
+    }
+    void renameItemWithIdentifier(std::string_view itemIdentifier, std::string_view toName,
+                                  ItemCompletionHandler handler) override {
+        act({"rename", itemIdentifier, toName}, handler);
+    }
+    void reparentItemWithIdentifier(std::string_view itemIdentifier,
+                                    std::string_view toParentItemWithIdentifier,
+                                    std::optional<std::string> newName,
+                                    ItemCompletionHandler handler) override {
+        act({"move", itemIdentifier, toParentItemWithIdentifier, newName.value_or("-")}, handler);
+    }
+    void trashItemWithIdentifier(std::string_view itemIdentifier,
+                                 ItemCompletionHandler handler) override {
+        act({"trash", itemIdentifier}, handler);
+    }
+    void untrashItemWithIdentifier(std::string_view itemIdentifier,
+                                   std::optional<std::string> toParentItemIdentifier,
+                                   ItemCompletionHandler handler) override {
+        act({"untrash", itemIdentifier, toParentItemIdentifier.value_or("-")}, handler);
+    }
+    void deleteItemWithIdentifier(std::string_view itemIdentifier,
+                                  ErrorCompletionHandler handler) override {
+        note({"delete", itemIdentifier});
+        handler(actionError);
+    }
+    void setLastUsedDate(std::optional<Date> date, std::string_view forItemIdentifier,
+                         ItemCompletionHandler handler) override {
+        act({"used", forItemIdentifier, date ? date->rfc3339() : "-"}, handler);
+    }
+    void setTagData(std::optional<Data> tagData, std::string_view forItemIdentifier,
+                    ItemCompletionHandler handler) override {
+        lastTagData = std::move(tagData);
+        act({"tag", forItemIdentifier}, handler);
+    }
+    void setFavoriteRank(std::optional<Number> rank, std::string_view forItemIdentifier,
+                         ItemCompletionHandler handler) override {
+        lastRank = rank;
+        act({"favorite", forItemIdentifier}, handler);
+    }
+    void _removeTrashedItemsOlderThanDate(const Date& date,
+                                          std::function<void()> handler) override {
+        note({"purge", date.rfc3339()});
+        handler();
+    }
+    std::optional<Data> lastTagData;
+    std::optional<Number> lastRank;
+
+  private:
+    void note(std::initializer_list<std::string_view> words) {
+        std::string line;
+        for (const std::string_view word : words) {
+            line.append(line.empty() ? "" : " ").append(word);
+        }
+        actions.push_back(std::move(line));
+    }
+    void act(std::initializer_list<std::string_view> words, const ItemCompletionHandler& handler) {
+        note(words);
+        if (actionError) {
+            handler(Unexpected(*actionError));
+        } else {
+            handler(itemForIdentifier(actionItem));
+        }
+    }
 };
 
 }  // namespace marrowdale::host

@@ -9,8 +9,10 @@
 #include "platform/testing/FakeExtendedAttributes.h"
 #include "platform/testing/FakeFileEventService.h"
 #include "platform/testing/FakeManager.h"
+#include "platform/testing/FaultInjectingFileOperations.h"
 #include "platform/testing/FaultInjectingFileSystem.h"
 #include "platform/testing/RecordingLogSink.h"
+#include "platform/testing/RefusingFileOperations.h"
 #include "platform/testing/ScriptedGenerationStore.h"
 
 namespace marrowdale {
@@ -25,13 +27,15 @@ struct FakePlatform {
     FaultInjectingFileSystem fileSystem{emptyFileSystem};
     FakeExtendedAttributes attributes;
     FakeWriteAccess writeAccess;
+    RefusingFileOperations noFileOperations;
+    FaultInjectingFileOperations fileOperations{noFileOperations};
     ScriptedGenerationStore store;
     FakeFileEventService events;
     FakeApplicationRegistry applications;
     FakeManager manager;
     SharedObjects shared;
-    Platform platform{log,    fileSystem,   attributes, writeAccess, store,
-                      events, applications, manager,    shared};
+    Platform platform{log,   fileSystem, attributes,   writeAccess, fileOperations,
+                      store, events,     applications, manager,     shared};
 };
 
 }  // namespace marrowdale

@@ -108,9 +108,9 @@ class FullDiskFileSystem : public EmptyFileSystem {
 TEST(LocalFileEnumeratorFaultTest, identifiersThatCantBeMadeDurableEndThePageWithTheError) {
     FakePlatform fake;
     FullDiskFileSystem files;
-    const Platform platform{fake.log,          files,        fake.attributes,
-                            fake.writeAccess,  fake.store,   fake.events,
-                            fake.applications, fake.manager, fake.shared};
+    const Platform platform{
+        fake.log,   files,       fake.attributes,   fake.writeAccess, fake.fileOperations,
+        fake.store, fake.events, fake.applications, fake.manager,     fake.shared};
     CollectingObserver observer;
     LocalFileEnumerator(platform, "fid=1", {URL::fileURL("/storage")})
         .enumerateItemsForObserver(observer, byName);

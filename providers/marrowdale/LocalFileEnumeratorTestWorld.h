@@ -66,9 +66,16 @@ class LocalFileEnumeratorTestWorld : public ::testing::TestWithParam<TestFileSys
     TemporaryDirectory directory_{GetParam().dir};
     TestWorld world_{directory_};
     ScriptedEvents events_{world_.fileEvents};
-    const Platform platform_{world_.log,          world_.fileSystem, world_.attributes,
-                             world_.writeAccess,  *world_.store,     events_,
-                             world_.applications, world_.manager,    world_.shared};
+    const Platform platform_{world_.log,
+                             world_.fileSystem,
+                             world_.attributes,
+                             world_.writeAccess,
+                             world_.fileOperations,
+                             *world_.store,
+                             events_,
+                             world_.applications,
+                             world_.manager,
+                             world_.shared};
 };
 
 }  // namespace marrowdale

@@ -6,17 +6,11 @@
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
 #include "providers/marrowdale/fs/FSRetiredReaders.h"
-#include "providers/marrowdale/items/ItemForIdentifier.h"
-#include "providers/marrowdale/items/LocalItem.h"
-#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
-#include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
-#include "providers/marrowdale/items/ProviderError.h"
+#include "providers/marrowdale/items/ItemLookup.h"
 
 namespace marrowdale {
 
 namespace {
-
-constexpr std::string_view documentsName = "Documents";
 
 std::string quoted(std::string_view text) {
     return "\"" + std::string(text) + "\"";
@@ -46,7 +40,7 @@ std::optional<URL> LocalFileProvider::URLForItemWithPersistentIdentifier(
     std::string_view itemIdentifier) noexcept {
     const LogSection section(platform_.log,
                              [&] { return "fetching URL for " + quoted(itemIdentifier); });
-    const auto url = _urlForItemWithPersistentIdentifier(itemIdentifier);
+    const auto url = urlOfItem(platform_, itemIdentifier);
     if (!url) {
         platform_.log.error("can't find URL matching identifier " + std::string(itemIdentifier) +
                             "; " + url.error().description());
@@ -57,17 +51,13 @@ std::optional<URL> LocalFileProvider::URLForItemWithPersistentIdentifier(
 
 std::optional<std::string> LocalFileProvider::persistentIdentifierForItemAtURL(
     const URL& url) noexcept {
-    const LogSection section(platform_.log, [&] {
-        return "fetching item identifier for " + quoted(url.absoluteString());
-    });
-    return _persistentIdentifierForItemAt(url);
+    return fetchIdentifierOfItemAt(platform_, url);
 }
 
 Expected<FileProviderItemPtr> LocalFileProvider::itemForIdentifier(
     std::string_view itemIdentifier) noexcept {
-    const LogSection section(
-        platform_.log, [&] { return "fetching item's properties for " + quoted(itemIdentifier); });
-    return lookUpItem(itemIdentifier);
+    auto item = fetchItem(platform_, itemIdentifier);
+    return item ? Expected<FileProviderItemPtr>(std::move(*item)) : Unexpected(item.error());
 }
 
 Expected<std::unique_ptr<FileProviderEnumerator>>
@@ -104,54 +94,17 @@ void LocalFileProvider::stopProvidingItemAtURL(const URL& /*url*/) noexcept {}
 void LocalFileProvider::itemChangedAtURL(const URL& /*url*/) noexcept {}
 
 Expected<FileProviderItemPtr> LocalFileProvider::itemForURL(const URL& url) {
-    const auto identifier = _persistentIdentifierForItemAt(url);
-    if (!identifier) {
-        platform_.log.error("identifier lookup failed for URL " + quoted(url.absoluteString()));
-        return Unexpected(
-            errorWithProviderCode(ProviderErrorCode::invalidItemURL, url.absoluteString()));
-    }
-    if (identifier->starts_with('#') || *identifier == VantrelTemporaryLocalFolderItemIdentifier) {
-        return lookUpItem(*identifier);
-    }
-    auto item = LocalItem::initWithURL(platform_, url);
-    if (!item) {
-        platform_.log.error("can't create item for URL " + quoted(url.absoluteString()));
-        return Unexpected(
-            errorWithProviderCode(ProviderErrorCode::itemNotFound, url.absoluteString()));
-    }
-    return FileProviderItemPtr(std::move(item));
+    auto item = itemAtURL(platform_, url);
+    return item ? Expected<FileProviderItemPtr>(std::move(*item)) : Unexpected(item.error());
 }
 
 Expected<URL> LocalFileProvider::_urlForItemWithPersistentIdentifier(
     std::string_view itemIdentifier) {
-    const auto item = itemForIdentifierString(platform_, itemIdentifier);
-    if (!item) {
-        return Unexpected(errorForNonExistentItem(itemIdentifier));
-    }
-    platform_.log.debug([&] { return "found " + std::string(itemIdentifier); });
-    return item->fileURL;
+    return urlOfItem(platform_, itemIdentifier);
 }
 
 std::optional<std::string> LocalFileProvider::_persistentIdentifierForItemAt(const URL& url) {
-    if (url.lastPathComponent() == documentsName) {
-        return MRWFileObjectIdentifier::fromAppLibraryDataContainerURL(platform_, url);
-    }
-    const auto item = LocalItem::initWithURL(platform_, url);
-    if (!item) {
-        return std::nullopt;
-    }
-    platform_.log.debug([&] { return "found " + item->itemIdentifier; });
-    return item->itemIdentifier;
-}
-
-Expected<FileProviderItemPtr> LocalFileProvider::lookUpItem(std::string_view itemIdentifier) {
-    auto item = itemForIdentifierString(platform_, itemIdentifier);
-    if (!item) {
-        platform_.log.error("item lookup failed for identifier " + quoted(itemIdentifier));
-        return Unexpected(errorForNonExistentItem(itemIdentifier));
-    }
-    platform_.log.debug([&] { return "found " + item->description(); });
-    return FileProviderItemPtr(std::move(item));
+    return identifierOfItemAt(platform_, url);
 }
 
 }  // namespace marrowdale

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -9,8 +10,6 @@
 #include "platform/hostframework/FileProviderExtension.h"
 
 namespace marrowdale {
-
-class LocalItem;
 
 // The object that the host makes and calls: every request enters here. Keeps no state that changes;
 // every look-up builds fresh records.
@@ -43,6 +42,33 @@ class LocalFileProvider : public FileProviderExtension {
     void stopProvidingItemAtURL(const URL& url) noexcept override;
     void itemChangedAtURL(const URL& url) noexcept override;
 
+    // Actions: see providers/marrowdale/actions.
+    void importDocumentAtURL(const URL& url, std::string_view toParentItemIdentifier,
+                             ItemCompletionHandler completionHandler) noexcept override;
+    void createDirectoryWithName(std::string_view name, std::string_view inParentItemIdentifier,
+                                 ItemCompletionHandler completionHandler) noexcept override;
+    void renameItemWithIdentifier(std::string_view itemIdentifier, std::string_view toName,
+                                  ItemCompletionHandler completionHandler) noexcept override;
+    void reparentItemWithIdentifier(std::string_view itemIdentifier,
+                                    std::string_view toParentItemWithIdentifier,
+                                    std::optional<std::string> newName,
+                                    ItemCompletionHandler completionHandler) noexcept override;
+    void trashItemWithIdentifier(std::string_view itemIdentifier,
+                                 ItemCompletionHandler completionHandler) noexcept override;
+    void untrashItemWithIdentifier(std::string_view itemIdentifier,
+                                   std::optional<std::string> toParentItemIdentifier,
+                                   ItemCompletionHandler completionHandler) noexcept override;
+    void deleteItemWithIdentifier(std::string_view itemIdentifier,
+                                  ErrorCompletionHandler completionHandler) noexcept override;
+    void setLastUsedDate(std::optional<Date> date, std::string_view forItemIdentifier,
+                         ItemCompletionHandler completionHandler) noexcept override;
+    void setTagData(std::optional<Data> tagData, std::string_view forItemIdentifier,
+                    ItemCompletionHandler completionHandler) noexcept override;
+    void setFavoriteRank(std::optional<Number> rank, std::string_view forItemIdentifier,
+                         ItemCompletionHandler completionHandler) noexcept override;
+    void _removeTrashedItemsOlderThanDate(
+        const Date& date, std::function<void()> completionHandler) noexcept override;
+
     // The item at a URL that an action holds. Fails with invalidItemURL when it has no identifier,
     // with itemNotFound when it has one and can't be served.
     [[nodiscard]] Expected<FileProviderItemPtr> itemForURL(const URL& url);
@@ -53,8 +79,6 @@ class LocalFileProvider : public FileProviderExtension {
     [[nodiscard]] std::optional<std::string> _persistentIdentifierForItemAt(const URL& url);
 
   private:
-    [[nodiscard]] Expected<FileProviderItemPtr> lookUpItem(std::string_view itemIdentifier);
-
     const Platform& platform_;
 };
 

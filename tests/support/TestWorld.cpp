@@ -29,12 +29,24 @@ std::unique_ptr<native::Store> openedStore(const TemporaryDirectory& directory,
     return std::move(*store);
 }
 
+std::unique_ptr<native::Temporaries> openedTemporaries(const TemporaryDirectory& directory,
+                                                       Log& log) {
+    auto temporaries = native::Temporaries::open(directory.path("state"), &log);
+    if (!temporaries) {
+        throw std::runtime_error(temporaries.error().description());
+    }
+    return std::move(*temporaries);
+}
+
 }  // namespace
 
-TestWorld::TestWorld(const TemporaryDirectory& directory, native::StoreOptions storeOptions)
+TestWorld::TestWorld(const TemporaryDirectory& directory, native::StoreOptions storeOptions,
+                     Serving serving)
     : rootPath_(madeRoot(directory)),
-      store(openedStore(directory, rootPath_, log, std::move(storeOptions))),
-      trees({rootPath_}, {directory.path("state"), directory.path("cache")}),
+      servedPath_(serving == Serving::storageRoot ? rootPath_ : directory.path()),
+      store(openedStore(directory, servedPath_, log, std::move(storeOptions))),
+      trees({servedPath_, rootPath_}, {directory.path("state"), directory.path("cache")}),
+      temporaries(openedTemporaries(directory, log)),
       realFileSystem(native::FileSources{.documents = *store,
                                          .types = types_,
                                          .packages = packages_,

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -12,10 +13,12 @@
 #include "platform/linux/files/LinuxWriteAccess.h"
 #include "platform/linux/files/MimeTypes.h"
 #include "platform/linux/files/PackageTypes.h"
+#include "platform/linux/operations/LinuxFileOperations.h"
 #include "platform/linux/store/Store.h"
 #include "platform/linux/streams/LinuxFileEvents.h"
 #include "platform/testing/FakeApplicationRegistry.h"
 #include "platform/testing/FakeManager.h"
+#include "platform/testing/FaultInjectingFileOperations.h"
 #include "platform/testing/FaultInjectingFileSystem.h"
 #include "platform/testing/RecordingLogSink.h"
 #include "platform/testing/TemporaryDirectory.h"
@@ -30,12 +33,19 @@ namespace marrowdale {
 // A second world on the same directory, after the first is gone, is what a new process finds.
 class TestWorld {
   public:
+    // What the store and the file services know: the storage root, or all of the directory, for app
+    // libraries that lie in it beside the storage root.
+    enum class Serving : std::uint8_t { storageRoot, wholeDirectory };
+
     // Makes the storage root when it is missing. `directory` lives longer. Throws
     // std::runtime_error where the store can't be opened. `storeOptions` say how it is opened, but
     // for where things lie and for the log, which are the world's.
-    explicit TestWorld(const TemporaryDirectory& directory, native::StoreOptions storeOptions = {});
+    explicit TestWorld(const TemporaryDirectory& directory, native::StoreOptions storeOptions = {},
+                       Serving serving = Serving::storageRoot);
     TestWorld(const TestWorld&) = delete;
     TestWorld& operator=(const TestWorld&) = delete;
+    // Answers that are still to come use the rest.
+    ~TestWorld() { realFileOperations_.finish(); }
 
     // The storage root's path, and that of something in it.
     [[nodiscard]] const std::string& root() const { return manager.documentStorageURL().path(); }
@@ -46,6 +56,7 @@ class TestWorld {
 
   private:
     const std::string rootPath_;
+    const std::string servedPath_;
     native::MimeTypes types_;
     native::PackageTypes packages_;
     native::AttributeCache attributeCache_;
@@ -58,6 +69,7 @@ class TestWorld {
     const std::unique_ptr<native::Store> store;
     native::LinuxFileEvents fileEvents{*store};
     const native::ServedTrees trees;
+    const std::unique_ptr<native::Temporaries> temporaries;
     native::LinuxFileSystem realFileSystem;
     FaultInjectingFileSystem fileSystem{realFileSystem};
     native::LinuxExtendedAttributes attributes{attributeCalls_, trees};
@@ -65,8 +77,14 @@ class TestWorld {
     FakeApplicationRegistry applications;
     FakeManager manager;
     SharedObjects shared;
-    const Platform platform{log,        fileSystem,   attributes, writeAccess, *store,
-                            fileEvents, applications, manager,    shared};
+
+  private:
+    native::LinuxFileOperations realFileOperations_{{trees, packages_, *temporaries}, &log};
+
+  public:
+    FaultInjectingFileOperations fileOperations{realFileOperations_};
+    const Platform platform{log,    fileSystem, attributes,   writeAccess, fileOperations,
+                            *store, fileEvents, applications, manager,     shared};
 };
 
 }  // namespace marrowdale

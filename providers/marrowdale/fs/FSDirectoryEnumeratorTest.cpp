@@ -111,9 +111,9 @@ class FSDirectoryEnumeratorTest : public ::testing::Test {
 
     FakePlatform fake_;
     FakeFolders files_;
-    Platform platform_{fake_.log,          files_,        fake_.attributes,
-                       fake_.writeAccess,  fake_.store,   fake_.events,
-                       fake_.applications, fake_.manager, fake_.shared};
+    Platform platform_{
+        fake_.log,   files_,       fake_.attributes,   fake_.writeAccess, fake_.fileOperations,
+        fake_.store, fake_.events, fake_.applications, fake_.manager,     fake_.shared};
     std::vector<URL> collected_;
 };
 

@@ -104,9 +104,16 @@ class FSEventReaderTestWorld : public ::testing::TestWithParam<TestFileSystem> {
     TemporaryDirectory directory_{GetParam().dir};
     TestWorld world_{directory_};
     FakeFileEventService events_;
-    const Platform platform_{world_.log,          world_.fileSystem, world_.attributes,
-                             world_.writeAccess,  *world_.store,     events_,
-                             world_.applications, world_.manager,    world_.shared};
+    const Platform platform_{world_.log,
+                             world_.fileSystem,
+                             world_.attributes,
+                             world_.writeAccess,
+                             world_.fileOperations,
+                             *world_.store,
+                             events_,
+                             world_.applications,
+                             world_.manager,
+                             world_.shared};
     std::shared_ptr<RecordingDelegate> delegate_ = std::make_shared<RecordingDelegate>();
     std::shared_ptr<FSEventReader> reader_;
 

@@ -105,9 +105,16 @@ TEST_P(FSGatherPhaseCheckerTest, theEventIsReadBeforeTheHistory) {
     } late;
     late.eventID = EventID{40};
     late.history = FakeFileEventService::emptyHistory();
-    const Platform platform{world_.log,          world_.fileSystem, world_.attributes,
-                            world_.writeAccess,  *world_.store,     late,
-                            world_.applications, world_.manager,    world_.shared};
+    const Platform platform{world_.log,
+                            world_.fileSystem,
+                            world_.attributes,
+                            world_.writeAccess,
+                            world_.fileOperations,
+                            *world_.store,
+                            late,
+                            world_.applications,
+                            world_.manager,
+                            world_.shared};
     EXPECT_EQ(FSEventReader::canResumeGatherPhase(platform, {world_.url("")}, EventID{10})->eventID,
               EventID{40});
 }

@@ -11,6 +11,7 @@
 #include "providers/marrowdale/items/ItemForIdentifier.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 #include "providers/marrowdale/items/ParentFolderCache.h"
+#include "providers/marrowdale/items/PutBack.h"
 
 namespace marrowdale {
 
@@ -231,6 +232,13 @@ void LocalItem::readBundleIdentifier(const Platform& platform, const Options& op
     }
     hx_lumenoDomainIdentifier = bundle;
     hx_appContainerBundleIdentifier = std::move(bundle);
+}
+
+std::optional<URL> LocalItem::putBackURL(const Platform& platform) {
+    if (!putBackURL_) {
+        putBackURL_ = readPutBackURL(platform, fileURL);
+    }
+    return *putBackURL_;
 }
 
 bool LocalItem::isRoot() const {

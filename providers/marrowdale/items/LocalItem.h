@@ -61,6 +61,11 @@ class LocalItem : public FileProviderItem {
     [[nodiscard]] static std::shared_ptr<LocalItem> initWithFileIdentifier(
         const Platform& platform, std::string_view identifier);
 
+    // The folder that a trashed item goes back to: looked up at first use (see PutBack.h) and kept.
+    // Not for several threads at once.
+    [[nodiscard]] std::optional<URL> putBackURL(const Platform& platform);
+    void setPutBackURL(std::optional<URL> url) { putBackURL_ = std::move(url); }
+
     [[nodiscard]] const std::string& itemIdentifierAsString() const { return itemIdentifier; }
     [[nodiscard]] const std::string& parentItemIdentifierAsString() const {
         return parentItemIdentifier;
@@ -93,6 +98,9 @@ class LocalItem : public FileProviderItem {
                               ParentFolderCache* parents);
     [[nodiscard]] bool isRoot() const;
     [[nodiscard]] bool isAppLibrary() const { return itemIdentifier.starts_with('#'); }
+
+    // Outer no value: not looked up yet.
+    std::optional<std::optional<URL>> putBackURL_;
 };
 
 // Whether, among the components of the path, ".Trash" directly follows "Documents".
