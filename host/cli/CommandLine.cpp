@@ -6,15 +6,26 @@
 
 #include "host/cli/AnchorCommand.h"
 #include "host/cli/ChangesCommand.h"
+#include "host/cli/DeleteCommand.h"
 #include "host/cli/DoctorCommand.h"
+#include "host/cli/FavoriteCommand.h"
 #include "host/cli/HelpFormatter.h"
 #include "host/cli/IdCommand.h"
+#include "host/cli/ImportCommand.h"
 #include "host/cli/InfoCommand.h"
 #include "host/cli/LsCommand.h"
+#include "host/cli/MkdirCommand.h"
+#include "host/cli/MoveCommand.h"
 #include "host/cli/PageCommand.h"
 #include "host/cli/PathCommand.h"
+#include "host/cli/PurgeCommand.h"
+#include "host/cli/RenameCommand.h"
 #include "host/cli/SearchCommand.h"
 #include "host/cli/ServeCommand.h"
+#include "host/cli/TagCommand.h"
+#include "host/cli/TrashCommand.h"
+#include "host/cli/UntrashCommand.h"
+#include "host/cli/UsedCommand.h"
 #include "host/cli/WatchCommand.h"
 
 namespace marrowdale::host {
@@ -42,6 +53,17 @@ std::vector<std::unique_ptr<Command>> allCommands() {
     commands.push_back(std::make_unique<AnchorCommand>());
     commands.push_back(std::make_unique<ChangesCommand>());
     commands.push_back(std::make_unique<WatchCommand>());
+    commands.push_back(std::make_unique<ImportCommand>());
+    commands.push_back(std::make_unique<MkdirCommand>());
+    commands.push_back(std::make_unique<RenameCommand>());
+    commands.push_back(std::make_unique<MoveCommand>());
+    commands.push_back(std::make_unique<TrashCommand>());
+    commands.push_back(std::make_unique<UntrashCommand>());
+    commands.push_back(std::make_unique<DeleteCommand>());
+    commands.push_back(std::make_unique<TagCommand>());
+    commands.push_back(std::make_unique<FavoriteCommand>());
+    commands.push_back(std::make_unique<UsedCommand>());
+    commands.push_back(std::make_unique<PurgeCommand>());
     commands.push_back(std::make_unique<ServeCommand>());
     commands.push_back(std::make_unique<DoctorCommand>());
     return commands;

@@ -1,6 +1,7 @@
 #include "host/cli/Failure.h"
 
 #include "host/requests/ErrorDescription.h"
+#include "host/requests/FeedJson.h"
 #include "host/requests/HarmlessText.h"
 #include "host/requests/ItemJson.h"
 #include "host/requests/JsonWriter.h"
@@ -12,6 +13,12 @@ namespace {
 
 constexpr std::string_view hostErrorDomain = "MarrowdaleHostErrorDomain";
 
+// A copy of our own: a failure is told after the extension's module, which made the item, has gone.
+FileProviderItemPtr lastingCopy(const FileProviderItemPtr& item) {
+    auto copy = item ? itemFromJson(itemJson(*item)) : Expected<FileProviderItemPtr>(nullptr);
+    return copy ? std::move(*copy) : nullptr;
+}
+
 }  // namespace
 
 Failure Failure::provider(const Error& error) {
@@ -22,7 +29,7 @@ Failure Failure::provider(const Error& error) {
             .name = std::move(description.name),
             .message = std::move(description.message),
             .details = std::move(description.details),
-            .item = description.item};
+            .item = lastingCopy(description.item)};
 }
 
 Failure Failure::nothingAt(std::string_view path) {

@@ -1,6 +1,7 @@
 #include "host/client/RemoteRequests.h"
 
 #include <cerrno>
+#include <optional>
 
 #include "host/requests/ErrorJson.h"
 #include "host/requests/FeedJson.h"
@@ -149,6 +150,43 @@ Expected<std::vector<FileProviderItemPtr>> RemoteRequests::search(
         return Unexpected(page.error());
     }
     return std::move(page->items);
+}
+
+Expected<FileProviderItemPtr> RemoteRequests::perform(const ItemAction& action,
+                                                      ActionObserver& observer,
+                                                      const std::stop_token& stop) {
+    auto connection = HttpConnection::open(stateFolder_);
+    if (!connection) {
+        return Unexpected(connection.error());
+    }
+    std::optional<Expected<FileProviderItemPtr>> result;
+    const EventTaker events = [&](std::string_view name, std::string_view data) {
+        if (name == "progress") {
+            if (const auto progress = progressFromJson(data)) {
+                observer.progressed(*progress);
+            }
+        } else if (name == "warning") {
+            observer.warned(textFromJson("warning", data).value_or(std::string(data)));
+        } else if (name == "failed") {
+            result = Unexpected(errorFromJson(data));
+        } else if (name == "done") {
+            result = data == "{}" ? Expected<FileProviderItemPtr>(nullptr) : itemFromJson(data);
+        }
+    };
+    auto answer =
+        (*connection)
+            ->follow({.method = "POST", .target = "/v1/actions", .body = actionJson(action)},
+                     events, stop);
+    if (result) {
+        return std::move(*result);
+    }
+    if (stop.stop_requested()) {
+        return Unexpected(errorWithPOSIXCode(ECANCELED));
+    }
+    if (answer && answer->status == statusOK) {
+        return Unexpected(errorWithPOSIXCode(ECONNRESET, "talk to the service", {}));
+    }
+    return Unexpected(bodyOf(std::move(answer)).error());
 }
 
 Expected<std::vector<Finding>> RemoteRequests::findings() {

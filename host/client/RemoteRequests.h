@@ -39,6 +39,9 @@ class RemoteRequests final : public HostRequests {
 
     [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> search(
         const std::vector<std::string>& words) override;
+    [[nodiscard]] Expected<FileProviderItemPtr> perform(const ItemAction& action,
+                                                        ActionObserver& observer,
+                                                        const std::stop_token& stop) override;
     [[nodiscard]] Expected<std::vector<Finding>> findings() override;
 
   private:

@@ -1,6 +1,8 @@
 #include "host/daemon/Api.h"
 
 #include <cerrno>
+#include <chrono>
+#include <mutex>
 #include <unistd.h>
 
 #include "host/requests/ErrorJson.h"
@@ -84,11 +86,45 @@ class SignalStream {
     std::unique_ptr<LocalRequests::Watch> watch_;
 };
 
+// Tells a client how its action gets on. Of progress only the newest is worth sending.
+class ToldObserver final : public ActionObserver {
+  public:
+    explicit ToldObserver(ApiReply& reply) : reply_(reply) {}
+    void progressed(const ActionProgress& progress) override {
+        const auto now = std::chrono::steady_clock::now();
+        const std::lock_guard lock(mutex_);
+        if (now < next_) {
+            return;
+        }
+        constexpr std::chrono::milliseconds pause{100};
+        next_ = now + pause;
+        reply_.event("progress", "progress", progressJson(progress));
+    }
+    void warned(const std::string& text) override {
+        // Each is told; so many of one action that they matter in number are not.
+        const std::lock_guard lock(mutex_);
+        constexpr int most = 1000;
+        if (++warnings_ <= most) {
+            reply_.event("warning " + std::to_string(warnings_), "warning",
+                         textJson("warning", text));
+        }
+    }
+
+  private:
+    ApiReply& reply_;
+    std::mutex mutex_;
+    std::chrono::steady_clock::time_point next_;  // guarded by mutex_
+    int warnings_ = 0;                            // guarded by mutex_
+};
+
 }  // namespace
 
 void Api::handle(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply) {
     if (request.path == std::vector<std::string>{"v1", "signals"} && request.method == "GET") {
         signals(request, reply);
+    } else if (request.path == std::vector<std::string>{"v1", "actions"} &&
+               request.method == "POST") {
+        act(request, reply);
     } else {
         reply->answer(answerTo(request));
     }
@@ -174,6 +210,23 @@ ApiAnswer Api::lookUp(const ApiRequest& request) {
     return answerOf(requests_.identifierAt(*path), [](const std::string& identifier) {
         return textJson("itemIdentifier", identifier);
     });
+}
+
+void Api::act(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply) {
+    const auto action = actionFromJson(request.body);
+    if (!action) {
+        reply->answer(failed(action.error()));
+        return;
+    }
+    reply->beginEvents();
+    ToldObserver observer(*reply);
+    const auto done = requests_.perform(*action, observer, reply->gone());
+    if (done) {
+        reply->event("end", "done", *done ? itemJson(**done) : "{}");
+    } else {
+        reply->event("end", "failed", errorJson(done.error()));
+    }
+    reply->endEvents();
 }
 
 void Api::signals(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply) {

@@ -23,6 +23,7 @@ class Api {
     [[nodiscard]] ApiAnswer childrenOf(const ApiRequest& request);
     [[nodiscard]] ApiAnswer changesOf(const ApiRequest& request);
     [[nodiscard]] ApiAnswer lookUp(const ApiRequest& request);
+    void act(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply);
     void signals(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply);
 
     LocalRequests& requests_;

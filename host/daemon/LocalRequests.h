@@ -3,6 +3,7 @@
 #include <functional>
 #include <string>
 
+#include "host/daemon/LocalActions.h"
 #include "host/daemon/ReplicaKeeper.h"
 #include "host/daemon/SignalHub.h"
 #include "host/requests/HostRequests.h"
@@ -16,6 +17,7 @@ struct LocalServices {
     SignalHub& signals;
     std::string rootPath;     // the storage root's, canonical
     std::string replicaPath;  // the replica's file
+    std::string stateFolder;
     std::function<std::vector<Finding>()> findings;
 };
 
@@ -25,7 +27,9 @@ class LocalRequests final : public HostRequests {
   public:
     // Listings and watches must have ended before the services go.
     explicit LocalRequests(LocalServices services)
-        : services_(std::move(services)), replica_(*this, *this, services_.replicaPath) {}
+        : services_(std::move(services)),
+          actions_(services_.extension, services_.rootPath, services_.stateFolder),
+          replica_(*this, *this, services_.replicaPath) {}
 
     [[nodiscard]] Expected<FileProviderItemPtr> item(std::string_view identifier) override;
     [[nodiscard]] Expected<std::string> identifierAt(std::string_view path) override;
@@ -44,6 +48,11 @@ class LocalRequests final : public HostRequests {
         const std::vector<std::string>& words) override {
         return replica_.search(words);
     }
+    [[nodiscard]] Expected<FileProviderItemPtr> perform(const ItemAction& action,
+                                                        ActionObserver& observer,
+                                                        const std::stop_token& stop) override {
+        return actions_.perform(action, observer, stop);
+    }
     [[nodiscard]] Expected<std::vector<Finding>> findings() override;
 
     [[nodiscard]] ReplicaKeeper& replica() { return replica_; }
@@ -58,6 +67,7 @@ class LocalRequests final : public HostRequests {
         std::string_view container);
 
     LocalServices services_;
+    LocalActions actions_;
     ReplicaKeeper replica_;
 };
 

@@ -15,6 +15,7 @@ class LocalRequestsTest : public ::testing::Test {
                               .signals = signals_,
                               .rootPath = "/root",
                               .replicaPath = ":memory:",
+                              .stateFolder = "/nowhere",
                               .findings = [] { return std::vector<Finding>{}; }});
     }
 

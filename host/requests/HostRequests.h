@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "host/requests/Finding.h"
+#include "host/requests/ItemAction.h"
 #include "platform/foundation/Data.h"
 #include "platform/foundation/Error.h"
 #include "platform/hostframework/FileProviderEnumeration.h"
@@ -90,6 +91,17 @@ class SearchRequests {
         const std::vector<std::string>& words) = 0;
 };
 
+class ActionRequests {
+  public:
+    virtual ~ActionRequests() = default;
+    // Has one action done and waits for its end: the item as it is then, null for a deletion and a
+    // purge. What the item does not allow is refused (the file domain's 513). A stop cancels what
+    // can be cancelled: ECANCELED, and no trace of it.
+    [[nodiscard]] virtual Expected<FileProviderItemPtr> perform(const ItemAction& action,
+                                                                ActionObserver& observer,
+                                                                const std::stop_token& stop) = 0;
+};
+
 class ServiceRequests {
   public:
     virtual ~ServiceRequests() = default;
@@ -100,6 +112,7 @@ class ServiceRequests {
 class HostRequests : public ItemRequests,
                      public FeedRequests,
                      public SearchRequests,
+                     public ActionRequests,
                      public ServiceRequests {};
 
 }  // namespace marrowdale::host
