@@ -8,9 +8,13 @@
 #include "benchmarks/Measurement.h"
 #include "platform/hostframework/FileProviderConstants.h"
 #include "platform/linux/applications/NoApplications.h"
+#include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/icons/LinuxDeviceInformation.h"
+#include "platform/linux/icons/LinuxIconService.h"
+#include "platform/linux/icons/PNGEncoder.h"
 #include "platform/linux/streams/LinuxFileEvents.h"
 #include "providers/marrowdale/LocalFileProvider.h"
 
@@ -23,6 +27,14 @@ class Manager : public FileProviderManager {
     const URL& documentStorageURL() const override { return root_; }
     void signalEnumeratorForContainerItemIdentifier(
         std::string_view /*containerItemIdentifier*/,
+        std::function<void(const std::optional<Error>&)> completionHandler) override {
+        if (completionHandler) {
+            completionHandler(std::nullopt);
+        }
+    }
+
+    void deleteIndexedItemsInDomains(
+        std::vector<std::string> /*domainIdentifiers*/,
         std::function<void(const std::optional<Error>&)> completionHandler) override {
         if (completionHandler) {
             completionHandler(std::nullopt);
@@ -81,7 +93,8 @@ class World::Parts {
     Parts(const std::string& root, const std::string& state)
         : store(openedStore(root, state)),
           trees({root}, {state, state + "/cache"}),
-          manager(URL::fileURL(root)) {}
+          manager(URL::fileURL(root)),
+          applicationSupport(state + "/data") {}
 
     std::unique_ptr<native::Store> store;
     native::LinuxFileEvents fileEvents{*store};
@@ -104,6 +117,10 @@ class World::Parts {
     native::NoApplications applications;
     Manager manager;
     SharedObjects shared;
+    native::LinuxApplicationSupport applicationSupport;
+    native::LinuxDeviceInformation deviceInformation{[](std::string_view) { return std::nullopt; }};
+    native::LinuxIconService icons;
+    native::PNGEncoder imageEncoder;
     Platform platform{.log = log,
                       .fileSystem = fileSystem,
                       .extendedAttributes = extendedAttributes,
@@ -112,7 +129,11 @@ class World::Parts {
                       .fileEvents = fileEvents,
                       .applications = applications,
                       .manager = manager,
-                      .shared = shared};
+                      .shared = shared,
+                      .applicationSupport = applicationSupport,
+                      .deviceInformation = deviceInformation,
+                      .icons = icons,
+                      .imageEncoder = imageEncoder};
     LocalFileProvider provider{platform};
 };
 

@@ -40,6 +40,7 @@ LAYERS = {
     "platform/linux/streams": ["platform/foundation", "platform/services"] + FILES
                               + ["platform/linux/store"],
     "platform/linux/applications": ["platform/foundation", "platform/services"] + FILES,
+    "platform/linux/icons": ["platform/foundation", "platform/services"] + FILES,
     # The module is reached through its entry point, so the host knows the extension's interfaces
     # and never its classes. The codes of its errors are part of what it answers.
     "host/requests": INTERFACES + FILES + ["providers/marrowdale/items/ProviderError.h"],

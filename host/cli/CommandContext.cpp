@@ -69,7 +69,10 @@ std::expected<WorldOptions, Failure> CommandContext::worldOptions() const {
     WorldOptions options{.settings = std::move(*places),
                          .logSink = logSink(environment_, options_),
                          .logThreshold = options_.verbose ? LogLevel::debug : LogLevel::error,
-                         .modulePath = ExtensionModule::standardPath()};
+                         .modulePath = ExtensionModule::standardPath(),
+                         .variable = [environment = environment_](std::string_view name) {
+                             return environment.variable(name);
+                         }};
     // Programs that read errors as JSON are told nothing else.
     if (!options_.json || ::isatty(STDERR_FILENO) == 1) {
         options.tellWaiting = [](const std::string& line) {

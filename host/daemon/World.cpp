@@ -12,9 +12,13 @@
 #include "host/daemon/Mounts.h"
 #include "platform/Platform.h"
 #include "platform/linux/applications/NoApplications.h"
+#include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/icons/LinuxDeviceInformation.h"
+#include "platform/linux/icons/LinuxIconService.h"
+#include "platform/linux/icons/PNGEncoder.h"
 #include "platform/linux/store/Store.h"
 #include "platform/linux/streams/LinuxFileEvents.h"
 
@@ -40,6 +44,8 @@ class World::Parts {
           extendedAttributes_(attributeCalls_, trees_),
           writeAccess_(trees_),
           manager_(options_.settings.rootPath),
+          applicationSupport_(options_.settings.dataHome),
+          deviceInformation_(options_.variable),
           platform_{.log = *log_,
                     .fileSystem = fileSystem_,
                     .extendedAttributes = extendedAttributes_,
@@ -48,7 +54,11 @@ class World::Parts {
                     .fileEvents = fileEvents_,
                     .applications = applications_,
                     .manager = manager_,
-                    .shared = shared_} {}
+                    .shared = shared_,
+                    .applicationSupport = applicationSupport_,
+                    .deviceInformation = deviceInformation_,
+                    .icons = icons_,
+                    .imageEncoder = imageEncoder_} {}
 
     ~Parts() {
         // Handlers refer to the extension.
@@ -111,6 +121,10 @@ class World::Parts {
     native::LinuxWriteAccess writeAccess_;
     native::NoApplications applications_;
     HostManager manager_;
+    native::LinuxApplicationSupport applicationSupport_;
+    native::LinuxDeviceInformation deviceInformation_;
+    native::LinuxIconService icons_;
+    native::PNGEncoder imageEncoder_;
     std::unique_ptr<ExtensionModule> module_;
     // Holds objects of the extension's, whose code is in the module.
     SharedObjects shared_;

@@ -19,7 +19,7 @@ class LocalFileProviderTest : public ::testing::TestWithParam<TestFileSystem> {
   protected:
     void addLibrary() {
         makeFolder(directory_.path("app/Documents"));
-        world_.applications.add("org.example.Notes", "Notes", directory_.path("app"));
+        world_.addLibrary("org.example.Notes", "Notes", directory_.path("app"));
     }
     std::string identifierOf(std::string_view name) {
         return provider_.persistentIdentifierForItemAtURL(world_.url(name)).value_or("none");

@@ -9,7 +9,9 @@
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/items/FileSystemAccess.h"
 #include "providers/marrowdale/items/ItemForIdentifier.h"
+#include "providers/marrowdale/items/LocalAppLibraryItem.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
+#include "providers/marrowdale/items/MRWAppLibraryManager.h"
 #include "providers/marrowdale/items/ParentFolderCache.h"
 
 namespace marrowdale {
@@ -65,6 +67,15 @@ std::shared_ptr<LocalItem> LocalItem::initWithURL(const Platform& platform, cons
 std::shared_ptr<LocalItem> LocalItem::initWithFileIdentifier(const Platform& platform,
                                                              std::string_view identifier) {
     return itemForIdentifierString(platform, identifier);
+}
+
+std::shared_ptr<LocalAppLibraryItem> LocalItem::fetchAppLibraryItem(
+    const Platform& platform) const {
+    if (hx_isContainer()) {
+        return nullptr;
+    }
+    const auto record = MRWAppLibraryManager::recordOfLibraryHolding(platform, fileURL);
+    return record ? LocalAppLibraryItem::initFrom(platform, *record) : nullptr;
 }
 
 bool LocalItem::initialise(const Platform& platform, const Options& options,

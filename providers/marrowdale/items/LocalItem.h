@@ -12,6 +12,7 @@
 
 namespace marrowdale {
 
+class LocalAppLibraryItem;
 class ParentFolderCache;
 
 // The record of a file or folder that the provider serves. Everything is read when it is made;
@@ -60,6 +61,11 @@ class LocalItem : public FileProviderItem {
     // The item of an identifier string of any kind; null when there is none.
     [[nodiscard]] static std::shared_ptr<LocalItem> initWithFileIdentifier(
         const Platform& platform, std::string_view identifier);
+
+    // The item of the app library that holds this one; null when none does, and for the item of an
+    // app library itself.
+    [[nodiscard]] std::shared_ptr<LocalAppLibraryItem> fetchAppLibraryItem(
+        const Platform& platform) const;
 
     [[nodiscard]] const std::string& itemIdentifierAsString() const { return itemIdentifier; }
     [[nodiscard]] const std::string& parentItemIdentifierAsString() const {
