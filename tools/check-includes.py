@@ -32,6 +32,7 @@ LAYERS = {
     "platform/SharedObjects.h": [],
     "providers/marrowdale/items": INTERFACES,
     "providers/marrowdale/fs": INTERFACES + ITEMS,
+    "providers/marrowdale/apps": INTERFACES + ITEMS,
     "providers/marrowdale": INTERFACES + EXTENSION,
     "platform/linux/files": ["platform/foundation", "platform/services"],
     "platform/linux/events": ["platform/foundation", "platform/services"] + FILES,
