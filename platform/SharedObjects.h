@@ -18,12 +18,7 @@ class SharedObjects {
     SharedObjects& operator=(const SharedObjects&) = delete;
     // Later objects may refer to earlier ones.
     ~SharedObjects() {
-        while (!slots_.empty()) {
-            auto last = slots_.begin();
-            for (auto slot = slots_.begin(); slot != slots_.end(); ++slot) {
-                last = slot->second->order > last->second->order ? slot : last;
-            }
-            slots_.erase(last);
+        while (takeLast() != nullptr) {
         }
     }
 
@@ -52,6 +47,15 @@ class SharedObjects {
         std::shared_ptr<void> object;
         unsigned order = 0;
     };
+    // Null when none is left. Without the lock it goes, for it may ask for others meanwhile.
+    std::shared_ptr<Slot> takeLast() {
+        const std::lock_guard lock(mutex_);
+        auto last = slots_.begin();
+        for (auto slot = slots_.begin(); slot != slots_.end(); ++slot) {
+            last = slot->second->order > last->second->order ? slot : last;
+        }
+        return last == slots_.end() ? nullptr : std::move(slots_.extract(last).mapped());
+    }
     std::shared_ptr<Slot> slotNamed(std::string_view name) {
         const std::lock_guard lock(mutex_);
         auto& slot = slots_[std::string(name)];

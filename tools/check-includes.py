@@ -33,6 +33,7 @@ LAYERS = {
     "providers/marrowdale/items": INTERFACES,
     "providers/marrowdale/fs": INTERFACES + ITEMS,
     "providers/marrowdale/apps": INTERFACES + ITEMS,
+    "providers/marrowdale/thumbnails": INTERFACES,
     "providers/marrowdale": INTERFACES + EXTENSION,
     "platform/linux/files": ["platform/foundation", "platform/services"],
     "platform/linux/events": ["platform/foundation", "platform/services"] + FILES,

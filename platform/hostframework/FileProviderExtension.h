@@ -9,6 +9,7 @@
 
 #include "platform/foundation/Error.h"
 #include "platform/foundation/URL.h"
+#include "platform/hostframework/FileProviderApplications.h"
 #include "platform/hostframework/FileProviderEnumeration.h"
 
 namespace marrowdale {
@@ -16,10 +17,8 @@ namespace marrowdale {
 struct Platform;
 
 // What a provider answers its host. Any thread, several at once. No exception leaves a call.
-class FileProviderExtension {
+class FileProviderExtension : public FileProviderApplications {
   public:
-    virtual ~FileProviderExtension() = default;
-
     // No value when nothing of that identifier exists; never fails.
     [[nodiscard]] virtual std::optional<URL> URLForItemWithPersistentIdentifier(
         std::string_view itemIdentifier) = 0;

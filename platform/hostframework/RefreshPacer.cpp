@@ -1,5 +1,6 @@
 #include "platform/hostframework/RefreshPacer.h"
 
+#include <algorithm>
 #include <optional>
 #include <system_error>
 #include <thread>
@@ -13,6 +14,9 @@ namespace marrowdale {
 namespace {
 
 using Clock = std::chrono::steady_clock;
+
+// Requests that are made together come to be one event.
+constexpr std::chrono::milliseconds gathering{10};
 
 }  // namespace
 
@@ -33,6 +37,9 @@ class RefreshPacer::Schedule : public std::enable_shared_from_this<Schedule> {
     }
     void signal() {
         const MutexLock lock(mutex_);
+        if (!signalled_) {
+            nextBegin_ = std::max(nextBegin_, Clock::now() + gathering);
+        }
         signalled_ = true;
         changed_.notifyAll();
     }
@@ -65,7 +72,7 @@ class RefreshPacer::Schedule : public std::enable_shared_from_this<Schedule> {
         MutexLock lock(mutex_);
         while (!closed_ && !isDue()) {
             if (isWanted()) {
-                (void)changed_.waitUntil(lock, *nextBegin_);
+                (void)changed_.waitUntil(lock, nextBegin_);
             } else {
                 changed_.wait(lock);
             }
@@ -77,7 +84,7 @@ class RefreshPacer::Schedule : public std::enable_shared_from_this<Schedule> {
         return resumed_ && signalled_ && !queued_;
     }
     [[nodiscard]] bool isDue() const MARROWDALE_REQUIRES(mutex_) {
-        return isWanted() && (!nextBegin_ || Clock::now() >= *nextBegin_);
+        return isWanted() && Clock::now() >= nextBegin_;
     }
 
     // On the queue.
@@ -102,7 +109,7 @@ class RefreshPacer::Schedule : public std::enable_shared_from_this<Schedule> {
     Mutex mutex_;
     Condition changed_;
     std::function<void()> block_ MARROWDALE_GUARDED_BY(mutex_);
-    std::optional<Clock::time_point> nextBegin_ MARROWDALE_GUARDED_BY(mutex_);
+    Clock::time_point nextBegin_ MARROWDALE_GUARDED_BY(mutex_) = Clock::time_point::min();
     bool resumed_ MARROWDALE_GUARDED_BY(mutex_) = false;
     bool signalled_ MARROWDALE_GUARDED_BY(mutex_) = false;
     bool queued_ MARROWDALE_GUARDED_BY(mutex_) = false;  // an event waits on the queue

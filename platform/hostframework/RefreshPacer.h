@@ -13,7 +13,8 @@ namespace marrowdale {
 // Turns many requests into few events: the event block runs on the queue at most once an interval,
 // counted from the beginning of one event to the beginning of the next, and at least once after
 // every signal. Signals before `resume` are kept; a signal while the block runs leads to another
-// event. Nothing runs, and nothing is woken, without a signal.
+// event. An event begins a little after its signal (10 ms), so that requests which are made
+// together have one. Nothing runs, and nothing is woken, without a signal.
 //
 // Any thread, also from the event block. The pacer may be released anywhere; an event that is
 // running then goes on to its end, and none begins any more.

@@ -1,28 +1,32 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/Platform.h"
 #include "platform/hostframework/FileProviderExtension.h"
 
 namespace marrowdale {
 
+class AppRefresh;
 class LocalItem;
 
-// The object that the host makes and calls: every request enters here. Keeps no state that changes;
-// every look-up builds fresh records.
+// The object that the host makes and calls: every request enters here. Keeps no state that changes,
+// but for the refreshes of app libraries; every look-up builds fresh records.
 class LocalFileProvider : public FileProviderExtension {
   public:
-    // Asks the host to read the working set again, for what changed while nothing ran. The platform
-    // lives longer than the provider and all that it hands out.
+    // Begins with a refresh of the app libraries, and asks the host to read the working set again,
+    // for what changed while nothing ran. The platform lives longer than the provider and all that
+    // it hands out.
     explicit LocalFileProvider(const Platform& platform);
     LocalFileProvider(const LocalFileProvider&) = delete;
     LocalFileProvider& operator=(const LocalFileProvider&) = delete;
-    // Waits for what enumerators that are gone left behind on queues, so that nothing of this
-    // module runs any more. The host has released its enumerators.
+    // Waits for a refresh that is running, and for what enumerators that are gone left behind on
+    // queues, so that nothing of this module runs any more. The host has released its enumerators.
     ~LocalFileProvider() override;
 
     std::optional<URL> URLForItemWithPersistentIdentifier(
@@ -43,6 +47,25 @@ class LocalFileProvider : public FileProviderExtension {
     void stopProvidingItemAtURL(const URL& url) noexcept override;
     void itemChangedAtURL(const URL& url) noexcept override;
 
+    void _refreshInstalledAppsWithCompletionHandler(
+        std::function<void()> completionHandler) noexcept override;
+    // The completion handler is called before it returns.
+    void _defaultApplicationContainerForBundleIdentifier(
+        std::string_view bundleIdentifier,
+        std::function<void(Expected<FileProviderItemPtr>)> completionHandler) noexcept override;
+    std::unique_ptr<Progress> fetchThumbnailsForItemIdentifiers(
+        const std::vector<std::string>& itemIdentifiers, ThumbnailSize requestedSize,
+        const TypedThumbnailHandler& perThumbnailCompletionHandlerWithType,
+        const std::function<void(const std::optional<Error>&)>& completionHandler) noexcept
+        override;
+    std::unique_ptr<Progress> fetchThumbnailsForItemIdentifiers(
+        const std::vector<std::string>& itemIdentifiers, ThumbnailSize requestedSize,
+        const ThumbnailHandler& perThumbnailCompletionHandler,
+        const std::function<void(const std::optional<Error>&)>& completionHandler) noexcept
+        override;
+    // The icon that suits this device's screen best.
+    [[nodiscard]] std::optional<Data> bestIconData(const BundleRecord& record) const;
+
     // The item at a URL that an action holds. Fails with invalidItemURL when it has no identifier,
     // with itemNotFound when it has one and can't be served.
     [[nodiscard]] Expected<FileProviderItemPtr> itemForURL(const URL& url);
@@ -56,6 +79,7 @@ class LocalFileProvider : public FileProviderExtension {
     [[nodiscard]] Expected<FileProviderItemPtr> lookUpItem(std::string_view itemIdentifier);
 
     const Platform& platform_;
+    const std::shared_ptr<AppRefresh> appRefresh_;
 };
 
 }  // namespace marrowdale

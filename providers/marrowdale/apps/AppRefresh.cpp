@@ -38,7 +38,9 @@ void AppRefresh::request(std::function<void()> completionHandler) {
     appRefreshQueue_.async([weak = weak_from_this(), handler = std::move(completionHandler)] {
         const auto self = weak.lock();
         if (self && self->appRefreshPacer_) {
-            self->appRefreshCompletionHandlers_.push_back(handler);
+            if (handler) {
+                self->appRefreshCompletionHandlers_.push_back(handler);
+            }
             self->appRefreshPacer_->signal();
         }
     });

@@ -12,8 +12,8 @@ namespace marrowdale {
 // Turns requests into at most one reading of the registry each half second, and tells the host what
 // to read again. Belongs to the provider; lives on while an event of its runs.
 //
-// A handler is called after every refresh from its request on. Any thread; handlers are called on
-// the queue "marrowdale.app-refresh.queue".
+// A handler is called after every refresh from its request on; an empty one only asks. Any thread;
+// handlers are called on the queue "marrowdale.app-refresh.queue".
 class AppRefresh : public std::enable_shared_from_this<AppRefresh> {
   public:
     // Asks for a first refresh, soon.

@@ -107,6 +107,14 @@ TEST_F(AppRefreshTest, nothingBeginsAfterTheEnd) {
     EXPECT_EQ(events(), before);
 }
 
+TEST_F(AppRefreshTest, anEmptyHandlerOnlyAsks) {
+    begin();
+    refreshNow();
+    const std::size_t before = events();
+    refresh_->request({});
+    EXPECT_TRUE(waitUntil([&] { return events() > before; }));
+}
+
 TEST_F(AppRefreshTest, aHandlerMayEndIt) {
     begin();
     refresh_->request([this] {

@@ -77,9 +77,12 @@ class AppsTestWorld : public ::testing::Test {
 
     // An application org.example.NAME whose library is there.
     std::shared_ptr<FakeBundleRecord> add(const std::string& name) {
-        makeFolder(directory_.path("apps/" + name + "/Documents"));
-        return world_.applications.add("org.example." + name, name,
-                                       directory_.path("apps/" + name));
+        makeFolder(library(name));
+        return world_.applications.add("org.example." + name, name, world_.path("apps/" + name));
+    }
+    // The folder of its documents: where the store records what happens.
+    std::string library(const std::string& name) const {
+        return world_.path("apps/" + name + "/Documents");
     }
     void remove(const std::string& name) { world_.applications.remove("org.example." + name); }
     Changed refresh() {
@@ -119,8 +122,14 @@ class AppsTestWorld : public ::testing::Test {
     }
     std::string mainFile() const { return directory_.path("data/Marrowdale/app-libraries.plist"); }
 
+    static native::StoreOptions listening() {
+        native::StoreOptions options;
+        options.recording = native::StoreOptions::Recording::live;
+        return options;
+    }
+
     TemporaryDirectory directory_;
-    TestWorld world_{directory_};
+    TestWorld world_{directory_, listening()};
 };
 
 }  // namespace marrowdale

@@ -41,8 +41,7 @@ TEST_F(LocalAppLibraryManagerTest, itLoadsTheCacheOfItsSource) {
     const LocalAppLibraryManager manager(world_.platform, Source::main);
     EXPECT_EQ(manager.versionToken(), 1U);
     EXPECT_EQ(identifiers(manager), Lines{"#org.example.A"});
-    EXPECT_EQ(manager.rootURLs(),
-              std::vector<URL>{URL::fileURL(directory_.path("apps/A/Documents"))});
+    EXPECT_EQ(manager.rootURLs(), std::vector<URL>{URL::fileURL(library("A"))});
     EXPECT_EQ(manager.records().size(), 1U);
     EXPECT_TRUE(identifiers(LocalAppLibraryManager(world_.platform, Source::workingSet)).empty());
 }
@@ -66,7 +65,7 @@ TEST_F(LocalAppLibraryManagerTest, aRecordWithoutAnItemIsSkippedWithALine) {
     add("A");
     add("B");
     (void)refresh();
-    std::filesystem::remove(directory_.path("apps/A/Documents"));
+    std::filesystem::remove(library("A"));
     const LocalAppLibraryManager manager(world_.platform, Source::main);
     EXPECT_EQ(identifiers(manager), Lines{"#org.example.B"});
     EXPECT_EQ(count("[DEBUG] can't create app library from bundle proxy "
@@ -119,7 +118,7 @@ TEST_F(LocalAppLibraryManagerTest, aRecordWithoutAnItemIsSkippedByAnUpgrade) {
     LocalAppLibraryManager manager(world_.platform, Source::main);
     add("A");
     (void)refresh();
-    std::filesystem::remove(directory_.path("apps/A/Documents"));
+    std::filesystem::remove(library("A"));
     EXPECT_EQ(manager.upgradeFromMainCache(nullptr, Searchable::no), Changed::yes);
     EXPECT_EQ(manager.versionToken(), 1U);
     EXPECT_TRUE(manager.items().empty());
