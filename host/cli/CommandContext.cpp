@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include "host/daemon/ExtensionModule.h"
+#include "host/daemon/IconProgram.h"
 #include "host/daemon/JournalSink.h"
 #include "host/daemon/StandardErrorSink.h"
 #include "platform/hostframework/FileProviderConstants.h"
@@ -70,6 +71,7 @@ std::expected<WorldOptions, Failure> CommandContext::worldOptions() const {
                          .logSink = logSink(environment_, options_),
                          .logThreshold = options_.verbose ? LogLevel::debug : LogLevel::error,
                          .modulePath = ExtensionModule::standardPath(),
+                         .iconProgramPath = iconProgramPath(),
                          .variable = [environment = environment_](std::string_view name) {
                              return environment.variable(name);
                          }};

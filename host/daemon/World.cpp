@@ -6,16 +6,19 @@
 #include <string_view>
 #include <utility>
 
+#include "host/daemon/AppRefreshRequests.h"
 #include "host/daemon/Doctor.h"
 #include "host/daemon/ExtensionModule.h"
 #include "host/daemon/HostManager.h"
 #include "host/daemon/Mounts.h"
 #include "platform/Platform.h"
-#include "platform/linux/applications/NoApplications.h"
+#include "platform/linux/applications/ApplicationWatch.h"
+#include "platform/linux/applications/LinuxApplicationRegistry.h"
 #include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/icons/ApplicationIcons.h"
 #include "platform/linux/icons/LinuxDeviceInformation.h"
 #include "platform/linux/icons/LinuxIconService.h"
 #include "platform/linux/icons/PNGEncoder.h"
@@ -46,6 +49,15 @@ class World::Parts {
           manager_(options_.settings.rootPath),
           applicationSupport_(options_.settings.dataHome),
           deviceInformation_(options_.variable),
+          applicationIcons_(native::IconTheme::placesFor(options_.variable),
+                            native::IconRenderer(options_.iconProgramPath), iconCache(options_)),
+          applications_(
+              {.places = native::applicationPlacesFor(options_.variable),
+               .storageRoot = options_.settings.rootPath,
+               .log = log_.get(),
+               .icons = [this](const std::optional<std::string>& icon,
+                               int variant) { return applicationIcons_.iconData(icon, variant); },
+               .documentFoldersChanged = {}}),
           platform_{.log = *log_,
                     .fileSystem = fileSystem_,
                     .extendedAttributes = extendedAttributes_,
@@ -61,9 +73,11 @@ class World::Parts {
                     .imageEncoder = imageEncoder_} {}
 
     ~Parts() {
+        applicationWatch_.reset();
         // Handlers refer to the extension.
         manager_.finishHandlers();
         requests_.reset();
+        appRefresh_.reset();
         extension_.reset();
     }
     Parts(const Parts&) = delete;
@@ -80,6 +94,8 @@ class World::Parts {
             return std::unexpected(std::move(extension.error()));
         }
         extension_ = std::move(*extension);
+        appRefresh_.emplace(*extension_);
+        watchApplications();
         requests_.emplace(
             LocalServices{.extension = *extension_,
                           .signals = manager_.signals(),
@@ -89,7 +105,11 @@ class World::Parts {
         return {};
     }
 
-    [[nodiscard]] LocalRequests& requests() { return *requests_; }
+    // Requests are answered from the applications of now.
+    [[nodiscard]] LocalRequests& requests() {
+        appRefresh_->waitForFirst();
+        return *requests_;
+    }
     [[nodiscard]] const Settings& settings() const { return options_.settings; }
     [[nodiscard]] Log& log() { return *log_; }
 
@@ -106,6 +126,27 @@ class World::Parts {
         return findings;
     }
 
+    [[nodiscard]] static native::IconCache iconCache(const WorldOptions& options) {
+        const std::string& folder = options.settings.cacheFolder;
+        return native::IconCache(folder.empty() ? folder : folder + "/icons");
+    }
+
+    // For as long as there is time for something to change.
+    void watchApplications() {
+        if (options_.recording != native::StoreOptions::Recording::live) {
+            return;
+        }
+        auto watch = native::ApplicationWatch::start(applications_.places(), [this] {
+            applicationIcons_.forget();
+            appRefresh_->ask();
+        });
+        if (!watch) {
+            log_->error("can't watch the applications; " + watch.error().description());
+            return;
+        }
+        applicationWatch_ = std::move(*watch);
+    }
+
     WorldOptions options_;
     std::unique_ptr<Log> log_;
     std::unique_ptr<native::Store> store_;
@@ -119,17 +160,20 @@ class World::Parts {
     native::LinuxFileSystem fileSystem_;
     native::LinuxExtendedAttributes extendedAttributes_;
     native::LinuxWriteAccess writeAccess_;
-    native::NoApplications applications_;
     HostManager manager_;
     native::LinuxApplicationSupport applicationSupport_;
     native::LinuxDeviceInformation deviceInformation_;
     native::LinuxIconService icons_;
     native::PNGEncoder imageEncoder_;
+    native::ApplicationIcons applicationIcons_;
+    native::LinuxApplicationRegistry applications_;
     std::unique_ptr<ExtensionModule> module_;
     // Holds objects of the extension's, whose code is in the module.
     SharedObjects shared_;
     Platform platform_;
     std::unique_ptr<FileProviderExtension> extension_;
+    std::optional<AppRefreshRequests> appRefresh_;
+    std::unique_ptr<native::ApplicationWatch> applicationWatch_;
     std::optional<LocalRequests> requests_;
 };
 

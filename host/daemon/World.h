@@ -21,6 +21,8 @@ struct WorldOptions {
     std::shared_ptr<LogSink> logSink;  // null: nothing is logged
     LogLevel logThreshold = LogLevel::error;
     std::string modulePath;
+    // The program that draws icons; where it is missing, applications have a plain one.
+    std::string iconProgramPath = {};
     // The value of an environment variable; none when it is unset or empty. Any thread.
     std::function<std::optional<std::string>(std::string_view name)> variable =
         [](std::string_view) { return std::nullopt; };
