@@ -47,7 +47,7 @@ class World::Parts {
           extendedAttributes_(attributeCalls_, trees_),
           writeAccess_(trees_),
           manager_(options_.settings.rootPath),
-          applicationSupport_(options_.settings.dataHome),
+          applicationSupport_(dataFolder(options_.settings)),
           deviceInformation_(options_.variable),
           applicationIcons_(native::IconTheme::placesFor(options_.variable),
                             native::IconRenderer(options_.iconProgramPath), iconCache(options_)),
@@ -126,6 +126,10 @@ class World::Parts {
         return findings;
     }
 
+    // The extension needs one, whether or not the user has a home.
+    [[nodiscard]] static std::string dataFolder(const Settings& settings) {
+        return settings.dataHome.empty() ? settings.stateFolder + "/data" : settings.dataHome;
+    }
     [[nodiscard]] static native::IconCache iconCache(const WorldOptions& options) {
         const std::string& folder = options.settings.cacheFolder;
         return native::IconCache(folder.empty() ? folder : folder + "/icons");
