@@ -8,9 +8,13 @@
 #include "benchmarks/Measurement.h"
 #include "platform/hostframework/FileProviderConstants.h"
 #include "platform/linux/applications/NoApplications.h"
+#include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/icons/LinuxDeviceInformation.h"
+#include "platform/linux/icons/LinuxIconService.h"
+#include "platform/linux/icons/PNGEncoder.h"
 #include "platform/linux/operations/LinuxFileOperations.h"
 #include "platform/linux/streams/LinuxFileEvents.h"
 #include "providers/marrowdale/LocalFileProvider.h"
@@ -24,6 +28,14 @@ class Manager : public FileProviderManager {
     const URL& documentStorageURL() const override { return root_; }
     void signalEnumeratorForContainerItemIdentifier(
         std::string_view /*containerItemIdentifier*/,
+        std::function<void(const std::optional<Error>&)> completionHandler) override {
+        if (completionHandler) {
+            completionHandler(std::nullopt);
+        }
+    }
+
+    void deleteIndexedItemsInDomains(
+        std::vector<std::string> /*domainIdentifiers*/,
         std::function<void(const std::optional<Error>&)> completionHandler) override {
         if (completionHandler) {
             completionHandler(std::nullopt);
@@ -91,7 +103,8 @@ class World::Parts {
         : store(openedStore(root, state)),
           trees({root}, {state, state + "/cache"}),
           temporaries(openedTemporaries(state)),
-          manager(URL::fileURL(root)) {}
+          manager(URL::fileURL(root)),
+          applicationSupport(state + "/data") {}
 
     std::unique_ptr<native::Store> store;
     native::LinuxFileEvents fileEvents{*store};
@@ -116,6 +129,10 @@ class World::Parts {
     native::NoApplications applications;
     Manager manager;
     SharedObjects shared;
+    native::LinuxApplicationSupport applicationSupport;
+    native::LinuxDeviceInformation deviceInformation{[](std::string_view) { return std::nullopt; }};
+    native::LinuxIconService icons;
+    native::PNGEncoder imageEncoder;
     Platform platform{.log = log,
                       .fileSystem = fileSystem,
                       .extendedAttributes = extendedAttributes,
@@ -125,7 +142,11 @@ class World::Parts {
                       .fileEvents = fileEvents,
                       .applications = applications,
                       .manager = manager,
-                      .shared = shared};
+                      .shared = shared,
+                      .applicationSupport = applicationSupport,
+                      .deviceInformation = deviceInformation,
+                      .icons = icons,
+                      .imageEncoder = imageEncoder};
     LocalFileProvider provider{platform};
 };
 

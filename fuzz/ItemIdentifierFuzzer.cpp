@@ -8,6 +8,7 @@
 
 #include "platform/foundation/FatalError.h"
 #include "platform/testing/FakePlatform.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/items/ItemForIdentifier.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 
@@ -43,9 +44,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* bytes, std::size_t siz
     fake.fileSystem.pathAnswer = [](marrowdale::DeviceID, marrowdale::FileID file) {
         return marrowdale::Expected<std::string>("/storage/" + std::to_string(raw(file)));
     };
-    const marrowdale::Platform platform{
-        fake.log,  fake.fileSystem, fake.attributes,   fake.writeAccess, fake.fileOperations,
-        documents, fake.events,     fake.applications, fake.manager,     fake.shared};
+    const marrowdale::Platform platform = marrowdale::withGenerationStore(fake.platform, documents);
     const auto url = marrowdale::fileURLWithItemIdentifier(platform, text);
     if (url && text.starts_with("did=")) {
         // The number in the place is the one in the text, with nothing cut off its front.

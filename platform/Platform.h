@@ -4,11 +4,15 @@
 #include "platform/foundation/Log.h"
 #include "platform/hostframework/FileProviderManager.h"
 #include "platform/services/ApplicationRegistry.h"
+#include "platform/services/ApplicationSupport.h"
+#include "platform/services/DeviceInformation.h"
 #include "platform/services/ExtendedAttributes.h"
 #include "platform/services/FileEventService.h"
 #include "platform/services/FileOperations.h"
 #include "platform/services/FileSystem.h"
 #include "platform/services/GenerationStore.h"
+#include "platform/services/IconService.h"
+#include "platform/services/ImageEncoder.h"
 
 namespace marrowdale {
 
@@ -26,6 +30,10 @@ struct Platform {
     ApplicationRegistry& applications;
     FileProviderManager& manager;
     SharedObjects& shared;
+    ApplicationSupport& applicationSupport;
+    DeviceInformation& deviceInformation;
+    IconService& icons;
+    ImageEncoder& imageEncoder;
 };
 
 }  // namespace marrowdale

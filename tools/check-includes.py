@@ -33,6 +33,8 @@ LAYERS = {
     "providers/marrowdale/items": INTERFACES,
     "providers/marrowdale/fs": INTERFACES + ITEMS,
     "providers/marrowdale/actions": INTERFACES + ITEMS + ["providers/marrowdale/fs"],
+    "providers/marrowdale/apps": INTERFACES + ITEMS,
+    "providers/marrowdale/thumbnails": INTERFACES,
     "providers/marrowdale": INTERFACES + EXTENSION,
     "platform/linux/files": ["platform/foundation", "platform/services"],
     "platform/linux/events": ["platform/foundation", "platform/services"] + FILES,
@@ -43,6 +45,7 @@ LAYERS = {
     "platform/linux/operations": ["platform/foundation", "platform/services"] + FILES
                                  + ["platform/linux/store"],
     "platform/linux/applications": ["platform/foundation", "platform/services"] + FILES,
+    "platform/linux/icons": ["platform/foundation", "platform/services"] + FILES,
     # The module is reached through its entry point, so the host knows the extension's interfaces
     # and never its classes. The codes of its errors are part of what it answers.
     "host/requests": INTERFACES + FILES + ["providers/marrowdale/items/ProviderError.h"],

@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include "host/daemon/ExtensionModule.h"
+#include "host/daemon/IconProgram.h"
 #include "host/daemon/JournalSink.h"
 #include "host/daemon/StandardErrorSink.h"
 #include "platform/hostframework/FileProviderConstants.h"
@@ -69,7 +70,11 @@ std::expected<WorldOptions, Failure> CommandContext::worldOptions() const {
     WorldOptions options{.settings = std::move(*places),
                          .logSink = logSink(environment_, options_),
                          .logThreshold = options_.verbose ? LogLevel::debug : LogLevel::error,
-                         .modulePath = ExtensionModule::standardPath()};
+                         .modulePath = ExtensionModule::standardPath(),
+                         .iconProgramPath = iconProgramPath(),
+                         .variable = [environment = environment_](std::string_view name) {
+                             return environment.variable(name);
+                         }};
     // Programs that read errors as JSON are told nothing else.
     if (!options_.json || ::isatty(STDERR_FILENO) == 1) {
         options.tellWaiting = [](const std::string& line) {

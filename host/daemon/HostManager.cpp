@@ -5,7 +5,9 @@
 namespace marrowdale::host {
 
 HostManager::HostManager(const std::string& rootPath)
-    : documentStorageURL_(URL::fileURL(rootPath)), handlers_("marrowdale.host.signals") {}
+    : documentStorageURL_(URL::fileURL(rootPath)),
+      handlers_("marrowdale.host.signals"),
+      deletions_("marrowdale.host.index") {}
 
 void HostManager::signalEnumeratorForContainerItemIdentifier(
     std::string_view containerItemIdentifier,
@@ -17,8 +19,17 @@ void HostManager::signalEnumeratorForContainerItemIdentifier(
     }
 }
 
+void HostManager::deleteIndexedItemsInDomains(
+    std::vector<std::string> /*domainIdentifiers*/,
+    std::function<void(const std::optional<Error>&)> completionHandler) {
+    if (completionHandler) {
+        deletions_.async([handler = std::move(completionHandler)] { handler(std::nullopt); });
+    }
+}
+
 void HostManager::finishHandlers() const {
     handlers_.sync([] {});
+    deletions_.sync([] {});
 }
 
 }  // namespace marrowdale::host

@@ -1,6 +1,9 @@
 #pragma once
 
+#include <functional>
+#include <optional>
 #include <string>
+#include <vector>
 
 #include "host/daemon/SignalHub.h"
 #include "platform/foundation/SerialQueue.h"
@@ -20,6 +23,11 @@ class HostManager final : public FileProviderManager {
         std::string_view containerItemIdentifier,
         std::function<void(const std::optional<Error>&)> completionHandler) override;
 
+    // There is no search index, so there is nothing to take out of it.
+    void deleteIndexedItemsInDomains(
+        std::vector<std::string> domainIdentifiers,
+        std::function<void(const std::optional<Error>&)> completionHandler) override;
+
     // Where signals arrive.
     [[nodiscard]] SignalHub& signals() { return signals_; }
 
@@ -31,6 +39,7 @@ class HostManager final : public FileProviderManager {
     URL documentStorageURL_;
     SignalHub signals_;
     SerialQueue handlers_;
+    SerialQueue deletions_;  // waits for nobody, for a provider may wait for it
 };
 
 }  // namespace marrowdale::host

@@ -140,7 +140,9 @@ Started<Settings> settingsFor(const SettingsOptions& options, const Environment&
         return std::unexpected(std::move(state.error()));
     }
     const auto cache = folderOf(environment, "XDG_CACHE_HOME", ".cache");
-    return Settings{*root, *state, cache ? *cache + "/marrowdale" : ""};
+    const auto data = folderOf(environment, "XDG_DATA_HOME", ".local/share");
+    return Settings{*root, *state, cache ? *cache + "/marrowdale" : "",
+                    data ? *data : *state + "/data"};
 }
 
 }  // namespace marrowdale::host

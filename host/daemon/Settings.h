@@ -20,6 +20,8 @@ struct Settings {
     std::string rootPath;     // without links; a folder that can be read
     std::string stateFolder;  // may be missing yet
     std::string cacheFolder;  // may be missing yet; empty where there is no home folder
+    std::string dataHome =
+        {};  // what programs keep for the user; in the state folder without a home
 };
 
 // The trash lies below a folder named "Documents"; under a root of another name there is none.

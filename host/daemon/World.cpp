@@ -12,9 +12,13 @@
 #include "host/daemon/Mounts.h"
 #include "platform/Platform.h"
 #include "platform/linux/applications/NoApplications.h"
+#include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
+#include "platform/linux/icons/LinuxDeviceInformation.h"
+#include "platform/linux/icons/LinuxIconService.h"
+#include "platform/linux/icons/PNGEncoder.h"
 #include "platform/linux/operations/LinuxFileOperations.h"
 #include "platform/linux/store/Store.h"
 #include "platform/linux/streams/LinuxFileEvents.h"
@@ -44,6 +48,8 @@ class World::Parts {
           writeAccess_(trees_),
           fileOperations_({trees_, packages_, *temporaries_}, log_.get()),
           manager_(options_.settings.rootPath),
+          applicationSupport_(dataFolder(options_.settings)),
+          deviceInformation_(options_.variable),
           platform_{.log = *log_,
                     .fileSystem = fileSystem_,
                     .extendedAttributes = extendedAttributes_,
@@ -53,7 +59,11 @@ class World::Parts {
                     .fileEvents = fileEvents_,
                     .applications = applications_,
                     .manager = manager_,
-                    .shared = shared_} {}
+                    .shared = shared_,
+                    .applicationSupport = applicationSupport_,
+                    .deviceInformation = deviceInformation_,
+                    .icons = icons_,
+                    .imageEncoder = imageEncoder_} {}
 
     ~Parts() {
         // Handlers refer to the extension.
@@ -103,6 +113,11 @@ class World::Parts {
         return findings;
     }
 
+    // The extension needs one, whether or not the user has a home.
+    [[nodiscard]] static std::string dataFolder(const Settings& settings) {
+        return settings.dataHome.empty() ? settings.stateFolder + "/data" : settings.dataHome;
+    }
+
     WorldOptions options_;
     std::unique_ptr<Log> log_;
     std::unique_ptr<native::Store> store_;
@@ -118,8 +133,13 @@ class World::Parts {
     native::LinuxExtendedAttributes extendedAttributes_;
     native::LinuxWriteAccess writeAccess_;
     native::LinuxFileOperations fileOperations_;
-    native::NoApplications applications_;
     HostManager manager_;
+    native::LinuxApplicationSupport applicationSupport_;
+    native::LinuxDeviceInformation deviceInformation_;
+    native::LinuxIconService icons_;
+    native::PNGEncoder imageEncoder_;
+    // The store records one tree; applications come when it records theirs beside it.
+    native::NoApplications applications_;
     std::unique_ptr<ExtensionModule> module_;
     // Holds objects of the extension's, whose code is in the module.
     SharedObjects shared_;

@@ -3,6 +3,9 @@
 #include <chrono>
 #include <functional>
 #include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
 
 #include "host/daemon/LocalRequests.h"
 #include "host/daemon/Settings.h"
@@ -18,6 +21,11 @@ struct WorldOptions {
     std::shared_ptr<LogSink> logSink;  // null: nothing is logged
     LogLevel logThreshold = LogLevel::error;
     std::string modulePath;
+    // The program that draws icons; where it is missing, applications have a plain one.
+    std::string iconProgramPath = {};
+    // The value of an environment variable; none when it is unset or empty. Any thread.
+    std::function<std::optional<std::string>(std::string_view name)> variable =
+        [](std::string_view) { return std::nullopt; };
     // How much history is kept.
     native::Retention retention = {};
     // Whether what happens is recorded as it happens.

@@ -121,7 +121,7 @@ class FakeEnumerator final : public FileProviderEnumerator {
 };
 
 // An extension that knows the items a test gave it.
-class FakeExtension final : public FileProviderExtension {
+class FakeExtension : public FileProviderExtension {
   public:
     std::map<std::string, std::shared_ptr<FakeItem>, std::less<>> items;
     std::vector<std::string> askedPaths;
@@ -230,6 +230,54 @@ class FakeExtension final : public FileProviderExtension {
     }
     std::optional<Data> lastTagData;
     std::optional<Number> lastRank;
+
+    // Refreshes are done at once.
+    void _refreshInstalledAppsWithCompletionHandler(std::function<void()> handler) override {
+        ++refreshes;
+        if (handler) {
+            refreshHandlers.push_back(std::move(handler));
+        }
+        for (const auto& each : refreshHandlers) {
+            each();
+        }
+    }
+    void _defaultApplicationContainerForBundleIdentifier(
+        std::string_view bundleIdentifier,
+        std::function<void(Expected<FileProviderItemPtr>)> handler) override {
+        const auto found = items.find("#" + std::string(bundleIdentifier));
+        if (found == items.end()) {
+            handler(Unexpected(errorInvalidParameter("bundleIdentifier", bundleIdentifier)));
+            return;
+        }
+        handler(FileProviderItemPtr(found->second));
+    }
+    std::unique_ptr<Progress> fetchThumbnailsForItemIdentifiers(
+        const std::vector<std::string>& identifiers, ThumbnailSize /*size*/,
+        const TypedThumbnailHandler& perThumbnail,
+        const std::function<void(const std::optional<Error>&)>& handler) override {
+        for (const std::string& identifier : identifiers) {
+            perThumbnail(identifier, {}, {}, {});
+        }
+        handler({});
+        return std::make_unique<Progress>();
+    }
+    // A library's thumbnail is its identifier.
+    std::unique_ptr<Progress> fetchThumbnailsForItemIdentifiers(
+        const std::vector<std::string>& identifiers, ThumbnailSize /*size*/,
+        const ThumbnailHandler& perThumbnail,
+        const std::function<void(const std::optional<Error>&)>& handler) override {
+        for (const std::string& identifier : identifiers) {
+            perThumbnail(identifier,
+                         identifier.starts_with('#') ? std::optional(Data::fromText(identifier))
+                                                     : std::nullopt,
+                         {});
+        }
+        handler({});
+        return std::make_unique<Progress>();
+    }
+
+    int refreshes = 0;
+    std::vector<std::function<void()>> refreshHandlers;
 
   private:
     void note(std::initializer_list<std::string_view> words) {

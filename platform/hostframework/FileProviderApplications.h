@@ -33,7 +33,7 @@ class FileProviderApplications {
     virtual ~FileProviderApplications() = default;
 
     // Reads the registry of applications again, soon. A handler is called after every refresh from
-    // then on, for as long as the extension lives.
+    // then on, for as long as the extension lives; an empty one only asks.
     virtual void _refreshInstalledAppsWithCompletionHandler(
         std::function<void()> completionHandler) = 0;
     virtual void _defaultApplicationContainerForBundleIdentifier(

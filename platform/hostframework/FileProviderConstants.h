@@ -24,6 +24,10 @@ inline constexpr std::string_view VantrelTemporaryLocalFolderItemIdentifier =
 [[nodiscard]] const Data& VantrelInitialPageSortedByDate();
 [[nodiscard]] const Data& VantrelInitialPageSortedByName();
 
+// The format of thumbnails that are icons in the icon service's cached-bitmap form.
+inline constexpr std::string_view VantrelThumbnailFormatCachedBitmap =
+    "VantrelThumbnailFormatCachedBitmap";
+
 // Codes of ErrorDomain::fileProvider.
 enum class FileProviderErrorCode : int {
     noSuchItem = -1001,         // subject: the identifier

@@ -10,6 +10,7 @@
 #include "platform/foundation/Error.h"
 #include "platform/foundation/URL.h"
 #include "platform/hostframework/FileProviderActions.h"
+#include "platform/hostframework/FileProviderApplications.h"
 #include "platform/hostframework/FileProviderEnumeration.h"
 
 namespace marrowdale {
@@ -17,7 +18,9 @@ namespace marrowdale {
 struct Platform;
 
 // What a provider answers its host. Any thread, several at once. No exception leaves a call.
-class FileProviderExtension : public FileProviderItemActions, public FileProviderMetadataActions {
+class FileProviderExtension : public FileProviderItemActions,
+                              public FileProviderMetadataActions,
+                              public FileProviderApplications {
   public:
     // No value when nothing of that identifier exists; never fails.
     [[nodiscard]] virtual std::optional<URL> URLForItemWithPersistentIdentifier(

@@ -2,7 +2,9 @@
 
 #include <functional>
 #include <optional>
+#include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/foundation/Error.h"
 #include "platform/foundation/URL.h"
@@ -21,6 +23,13 @@ class FileProviderManager {
     // called once, with an error if the host could not take it.
     virtual void signalEnumeratorForContainerItemIdentifier(
         std::string_view containerItemIdentifier,
+        std::function<void(const std::optional<Error>&)> completionHandler) = 0;
+
+    // Takes the items of these domains out of the host's search index. Returns at once; the
+    // handler, which may be empty, is called once when it is done, on a queue of the host's that
+    // waits for no provider: a provider may wait for the handler.
+    virtual void deleteIndexedItemsInDomains(
+        std::vector<std::string> domainIdentifiers,
         std::function<void(const std::optional<Error>&)> completionHandler) = 0;
 };
 

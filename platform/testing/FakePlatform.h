@@ -6,8 +6,11 @@
 #include "platform/Platform.h"
 #include "platform/testing/EmptyFileSystem.h"
 #include "platform/testing/FakeApplicationRegistry.h"
+#include "platform/testing/FakeApplicationSupport.h"
+#include "platform/testing/FakeDeviceInformation.h"
 #include "platform/testing/FakeExtendedAttributes.h"
 #include "platform/testing/FakeFileEventService.h"
+#include "platform/testing/FakeImageServices.h"
 #include "platform/testing/FakeManager.h"
 #include "platform/testing/FaultInjectingFileOperations.h"
 #include "platform/testing/FaultInjectingFileSystem.h"
@@ -33,9 +36,14 @@ struct FakePlatform {
     FakeFileEventService events;
     FakeApplicationRegistry applications;
     FakeManager manager;
+    FakeApplicationSupport applicationSupport;
+    FakeDeviceInformation device;
+    FakeIconService icons;
+    FakeImageEncoder imageEncoder;
     SharedObjects shared;
-    Platform platform{log,   fileSystem, attributes,   writeAccess, fileOperations,
-                      store, events,     applications, manager,     shared};
+    Platform platform{log,    fileSystem,   attributes, writeAccess, fileOperations,     store,
+                      events, applications, manager,    shared,      applicationSupport, device,
+                      icons,  imageEncoder};
 };
 
 }  // namespace marrowdale

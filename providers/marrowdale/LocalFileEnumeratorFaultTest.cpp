@@ -5,6 +5,7 @@
 #include "platform/hostframework/FileProviderConstants.h"
 #include "platform/testing/CollectingObserver.h"
 #include "platform/testing/FakePlatform.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
 #include "providers/marrowdale/items/ProviderError.h"
 
@@ -108,9 +109,7 @@ class FullDiskFileSystem : public EmptyFileSystem {
 TEST(LocalFileEnumeratorFaultTest, identifiersThatCantBeMadeDurableEndThePageWithTheError) {
     FakePlatform fake;
     FullDiskFileSystem files;
-    const Platform platform{
-        fake.log,   files,       fake.attributes,   fake.writeAccess, fake.fileOperations,
-        fake.store, fake.events, fake.applications, fake.manager,     fake.shared};
+    const Platform platform = withFileSystem(fake.platform, files);
     CollectingObserver observer;
     LocalFileEnumerator(platform, "fid=1", {URL::fileURL("/storage")})
         .enumerateItemsForObserver(observer, byName);

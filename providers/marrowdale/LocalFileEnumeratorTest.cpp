@@ -135,7 +135,7 @@ TEST_P(LocalFileEnumeratorTest, itemsOfAnAppLibraryCarryItsBundleIdentifier) {
     makeFolder(world_.path("app/Documents"));
     writeFile(world_.path("app/Documents/a"), "");
     writeFile(world_.path("app/b"), "");
-    world_.applications.add("org.example.Notes", "Notes", world_.path("app"));
+    world_.addLibrary("org.example.Notes", "Notes", world_.path("app"));
     const auto bundleIdentifiers = [&](std::string_view folder) {
         CollectingObserver observer;
         LocalFileEnumerator(world_.platform, "fid=1", {world_.url(folder)})

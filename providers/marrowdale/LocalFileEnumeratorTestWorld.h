@@ -12,6 +12,7 @@
 #include "platform/testing/CollectingObserver.h"
 #include "platform/testing/FakeFileEventService.h"
 #include "platform/testing/ForwardingFileEventService.h"
+#include "platform/testing/PlatformVariants.h"
 #include "platform/testing/TestFileSystems.h"
 #include "platform/testing/TestFiles.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
@@ -66,16 +67,7 @@ class LocalFileEnumeratorTestWorld : public ::testing::TestWithParam<TestFileSys
     TemporaryDirectory directory_{GetParam().dir};
     TestWorld world_{directory_};
     ScriptedEvents events_{world_.fileEvents};
-    const Platform platform_{world_.log,
-                             world_.fileSystem,
-                             world_.attributes,
-                             world_.writeAccess,
-                             world_.fileOperations,
-                             *world_.store,
-                             events_,
-                             world_.applications,
-                             world_.manager,
-                             world_.shared};
+    const Platform platform_ = withFileEvents(world_.platform, events_);
 };
 
 }  // namespace marrowdale

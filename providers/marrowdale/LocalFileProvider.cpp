@@ -5,6 +5,8 @@
 
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
+#include "providers/marrowdale/LocalRootEnumerator.h"
+#include "providers/marrowdale/apps/AppRefresh.h"
 #include "providers/marrowdale/fs/FSRetiredReaders.h"
 #include "providers/marrowdale/items/ItemLookup.h"
 
@@ -24,7 +26,8 @@ bool gathersSeveralTrees(std::string_view identifier) {
 
 }  // namespace
 
-LocalFileProvider::LocalFileProvider(const Platform& platform) : platform_(platform) {
+LocalFileProvider::LocalFileProvider(const Platform& platform)
+    : platform_(platform), appRefresh_(AppRefresh::begin(platform)) {
     platform_.log.info([] {
         return "auto notify changes on VantrelWorkingSetContainerItemIdentifier at startup";
     });
@@ -33,6 +36,7 @@ LocalFileProvider::LocalFileProvider(const Platform& platform) : platform_(platf
 }
 
 LocalFileProvider::~LocalFileProvider() {
+    appRefresh_->end();
     FSRetiredReaders::of(platform_).waitUntilGone();
 }
 
@@ -67,9 +71,7 @@ LocalFileProvider::enumeratorForContainerItemIdentifier(
     const LogSection section(
         platform_.log, [&] { return "enumerator for " + std::string(containerItemIdentifier); });
     if (gathersSeveralTrees(container)) {
-        return std::make_unique<LocalFileEnumerator>(
-            platform_, std::move(container),
-            std::vector<URL>{platform_.manager.documentStorageURL()});
+        return std::make_unique<LocalRootEnumerator>(platform_, std::move(container));
     }
     const auto url = _urlForItemWithPersistentIdentifier(container);
     if (!url) {

@@ -5,23 +5,27 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/Platform.h"
 #include "platform/hostframework/FileProviderExtension.h"
 
 namespace marrowdale {
 
-// The object that the host makes and calls: every request enters here. Keeps no state that changes;
-// every look-up builds fresh records.
+class AppRefresh;
+
+// The object that the host makes and calls: every request enters here. Keeps no state that changes,
+// but for the refreshes of app libraries; every look-up builds fresh records.
 class LocalFileProvider : public FileProviderExtension {
   public:
-    // Asks the host to read the working set again, for what changed while nothing ran. The platform
-    // lives longer than the provider and all that it hands out.
+    // Begins with a refresh of the app libraries, and asks the host to read the working set again,
+    // for what changed while nothing ran. The platform lives longer than the provider and all that
+    // it hands out.
     explicit LocalFileProvider(const Platform& platform);
     LocalFileProvider(const LocalFileProvider&) = delete;
     LocalFileProvider& operator=(const LocalFileProvider&) = delete;
-    // Waits for what enumerators that are gone left behind on queues, so that nothing of this
-    // module runs any more. The host has released its enumerators.
+    // Waits for a refresh that is running, and for what enumerators that are gone left behind on
+    // queues, so that nothing of this module runs any more. The host has released its enumerators.
     ~LocalFileProvider() override;
 
     std::optional<URL> URLForItemWithPersistentIdentifier(
@@ -42,6 +46,24 @@ class LocalFileProvider : public FileProviderExtension {
     void stopProvidingItemAtURL(const URL& url) noexcept override;
     void itemChangedAtURL(const URL& url) noexcept override;
 
+    void _refreshInstalledAppsWithCompletionHandler(
+        std::function<void()> completionHandler) noexcept override;
+    // The completion handler is called before it returns.
+    void _defaultApplicationContainerForBundleIdentifier(
+        std::string_view bundleIdentifier,
+        std::function<void(Expected<FileProviderItemPtr>)> completionHandler) noexcept override;
+    std::unique_ptr<Progress> fetchThumbnailsForItemIdentifiers(
+        const std::vector<std::string>& itemIdentifiers, ThumbnailSize requestedSize,
+        const TypedThumbnailHandler& perThumbnailCompletionHandlerWithType,
+        const std::function<void(const std::optional<Error>&)>& completionHandler) noexcept
+        override;
+    std::unique_ptr<Progress> fetchThumbnailsForItemIdentifiers(
+        const std::vector<std::string>& itemIdentifiers, ThumbnailSize requestedSize,
+        const ThumbnailHandler& perThumbnailCompletionHandler,
+        const std::function<void(const std::optional<Error>&)>& completionHandler) noexcept
+        override;
+    // The icon that suits this device's screen best.
+    [[nodiscard]] std::optional<Data> bestIconData(const BundleRecord& record) const;
     // Actions: see providers/marrowdale/actions.
     void importDocumentAtURL(const URL& url, std::string_view toParentItemIdentifier,
                              ItemCompletionHandler completionHandler) noexcept override;
@@ -80,6 +102,7 @@ class LocalFileProvider : public FileProviderExtension {
 
   private:
     const Platform& platform_;
+    const std::shared_ptr<AppRefresh> appRefresh_;
 };
 
 }  // namespace marrowdale

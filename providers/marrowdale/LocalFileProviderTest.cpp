@@ -3,12 +3,14 @@
 
 #include <gtest/gtest.h>
 
+#include "platform/foundation/Semaphore.h"
 #include "platform/hostframework/FileProviderConstants.h"
 #include "platform/testing/CollectingObserver.h"
 #include "platform/testing/TestFileSystems.h"
 #include "platform/testing/TestFiles.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
 #include "providers/marrowdale/LocalFileProvider.h"
+#include "providers/marrowdale/LocalRootEnumerator.h"
 #include "providers/marrowdale/items/ProviderError.h"
 #include "tests/support/TestWorld.h"
 
@@ -17,9 +19,14 @@ namespace {
 
 class LocalFileProviderTest : public ::testing::TestWithParam<TestFileSystem> {
   protected:
+    // An application's library, as a refresh finds it.
     void addLibrary() {
         makeFolder(directory_.path("app/Documents"));
         world_.applications.add("org.example.Notes", "Notes", directory_.path("app"));
+        // Handlers are called after every refresh for as long as the provider lives.
+        const auto done = std::make_shared<Semaphore>();
+        provider_._refreshInstalledAppsWithCompletionHandler([done] { done->signal(); });
+        done->wait();
     }
     std::string identifierOf(std::string_view name) {
         return provider_.persistentIdentifierForItemAtURL(world_.url(name)).value_or("none");
@@ -160,12 +167,37 @@ TEST_P(LocalFileProviderTest, theContainersOfSeveralTreesAlwaysGetAnEnumerator) 
           VantrelAllDirectoriesContainerItemIdentifier}) {
         const auto enumerator = provider_.enumeratorForContainerItemIdentifier(container);
         ASSERT_TRUE(enumerator);
-        const auto* local = dynamic_cast<const LocalFileEnumerator*>(enumerator->get());
-        ASSERT_NE(local, nullptr);
-        EXPECT_EQ(local->container(), container);
-        EXPECT_EQ(local->enumeratedItemURL(), world_.manager.documentStorageURL());
+        const auto* gathering = dynamic_cast<const LocalRootEnumerator*>(enumerator->get());
+        ASSERT_NE(gathering, nullptr);
+        EXPECT_EQ(gathering->container(), container);
+        EXPECT_EQ(gathering->localFileEnumerator()->enumeratedItemURL(),
+                  world_.manager.documentStorageURL());
         EXPECT_EQ(countContaining(" enumerator for " + std::string(container)), 1U);
     }
+}
+
+TEST_P(LocalFileProviderTest, aRefreshMakesALibraryKnownAndSignalsTheHost) {
+    addLibrary();
+    EXPECT_TRUE(waitUntil([&] { return world_.manager.signalled().size() == 3; }));
+    EXPECT_EQ(world_.manager.signalled(),
+              (std::vector<std::string>{std::string(VantrelWorkingSetContainerItemIdentifier),
+                                        std::string(VantrelRootContainerItemIdentifier),
+                                        std::string(VantrelWorkingSetContainerItemIdentifier)}));
+    EXPECT_EQ(
+        provider_.persistentIdentifierForItemAtURL(URL::fileURL(directory_.path("app/Documents"))),
+        "#org.example.Notes");
+}
+
+TEST_P(LocalFileProviderTest, theDefaultContainerOfAnApplicationIsItsLibrary) {
+    addLibrary();
+    std::vector<Expected<FileProviderItemPtr>> answers;
+    for (const char* identifier : {"org.example.Notes", "org.example.None"}) {
+        provider_._defaultApplicationContainerForBundleIdentifier(
+            identifier, [&](auto answer) { answers.push_back(std::move(answer)); });
+    }
+    ASSERT_EQ(answers.size(), 2U);
+    EXPECT_EQ((*answers[0])->itemIdentifier, "#org.example.Notes");
+    EXPECT_EQ(answers[1].error(), errorInvalidParameter("bundleIdentifier", "org.example.None"));
 }
 
 TEST_P(LocalFileProviderTest, anOrdinaryFolderGetsAnEnumeratorOverItsURL) {

@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "platform/testing/TestFiles.h"
+#include "tests/support/AddedLibraries.h"
 
 namespace marrowdale {
 
@@ -54,6 +55,14 @@ TestWorld::TestWorld(const TemporaryDirectory& directory, native::StoreOptions s
                                          .calls = attributeCalls_,
                                          .trees = trees,
                                          .work = sharedWork_}),
-      manager(rootPath_) {}
+      manager(rootPath_),
+      applicationSupport(directory.path("data")) {}
+
+std::shared_ptr<FakeBundleRecord> TestWorld::addLibrary(std::string identifier,
+                                                        std::string displayName,
+                                                        std::string_view containerPath) {
+    return marrowdale::addLibrary(platform, applications, std::move(identifier),
+                                  std::move(displayName), containerPath);
+}
 
 }  // namespace marrowdale

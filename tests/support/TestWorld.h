@@ -8,15 +8,19 @@
 #include "platform/Platform.h"
 #include "platform/linux/files/AttributeCache.h"
 #include "platform/linux/files/AttributeCalls.h"
+#include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/LinuxWriteAccess.h"
 #include "platform/linux/files/MimeTypes.h"
 #include "platform/linux/files/PackageTypes.h"
+#include "platform/linux/icons/LinuxIconService.h"
+#include "platform/linux/icons/PNGEncoder.h"
 #include "platform/linux/operations/LinuxFileOperations.h"
 #include "platform/linux/store/Store.h"
 #include "platform/linux/streams/LinuxFileEvents.h"
 #include "platform/testing/FakeApplicationRegistry.h"
+#include "platform/testing/FakeDeviceInformation.h"
 #include "platform/testing/FakeManager.h"
 #include "platform/testing/FaultInjectingFileOperations.h"
 #include "platform/testing/FaultInjectingFileSystem.h"
@@ -26,9 +30,9 @@
 namespace marrowdale {
 
 // A whole world on real folders: the storage root "Documents" in a temporary directory, the store's
-// state in "state" beside it, the real file system and store over them; a host and an application
-// registry that a test decides about, and a log that remembers. Where a fault can't be provoked, a
-// test puts it into `fileSystem`.
+// state in "state" beside it, the extension's own files in "data", the real file system and store
+// over them; a host and an application registry that a test decides about, and a log that
+// remembers. Where a fault can't be provoked, a test puts it into `fileSystem`.
 //
 // A second world on the same directory, after the first is gone, is what a new process finds.
 class TestWorld {
@@ -53,6 +57,9 @@ class TestWorld {
         return root() + "/" + std::string(name);
     }
     [[nodiscard]] URL url(std::string_view name) const { return URL::fileURL(path(name)); }
+    // An application whose library the extension knows; see addLibrary.
+    std::shared_ptr<FakeBundleRecord> addLibrary(std::string identifier, std::string displayName,
+                                                 std::string_view containerPath);
 
   private:
     const std::string rootPath_;
@@ -77,14 +84,20 @@ class TestWorld {
     FakeApplicationRegistry applications;
     FakeManager manager;
     SharedObjects shared;
+    native::LinuxApplicationSupport applicationSupport;
+    FakeDeviceInformation device;
+    native::LinuxIconService icons;
+    native::PNGEncoder imageEncoder;
 
   private:
     native::LinuxFileOperations realFileOperations_{{trees, packages_, *temporaries}, &log};
 
   public:
     FaultInjectingFileOperations fileOperations{realFileOperations_};
-    const Platform platform{log,    fileSystem, attributes,   writeAccess, fileOperations,
-                            *store, fileEvents, applications, manager,     shared};
+    const Platform platform{
+        log,        fileSystem,   attributes, writeAccess, fileOperations,     *store,
+        fileEvents, applications, manager,    shared,      applicationSupport, device,
+        icons,      imageEncoder};
 };
 
 }  // namespace marrowdale

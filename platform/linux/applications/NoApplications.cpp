@@ -2,6 +2,9 @@
 
 namespace marrowdale::native {
 
+void NoApplications::enumerateApplications(ApplicationKind /*kind*/, const RecordBlock& /*block*/) {
+}
+
 std::shared_ptr<const BundleRecord> NoApplications::proxyFor(const URL& /*url*/,
                                                              URLRelationship /*relationship*/) {
     return nullptr;
@@ -12,8 +15,14 @@ std::shared_ptr<const BundleRecord> NoApplications::bundleRecordForIdentifier(
     return nullptr;
 }
 
-std::vector<URL> NoApplications::documentFolders() {
-    return {};
+std::shared_ptr<const BundleRecord> NoApplications::unarchivedRecord(
+    const ArchivedBundleRecord& /*record*/) {
+    return nullptr;
+}
+
+std::optional<PropertyListDictionary> NoApplications::infoValuesForKeys(
+    const BundleRecord& /*record*/, std::span<const std::string_view> /*keys*/) {
+    return std::nullopt;
 }
 
 }  // namespace marrowdale::native

@@ -4,15 +4,20 @@
 
 namespace marrowdale::native {
 
-// A registry of a system without applications: it knows no record and serves no documents folder,
-// so the provider serves the storage root alone. Any thread.
+// A registry of a system without applications, so the provider serves the storage root alone. Any
+// thread.
 class NoApplications final : public ApplicationRegistry {
   public:
-    [[nodiscard]] std::shared_ptr<const BundleRecord> proxyFor(
-        const URL& url, URLRelationship relationship) override;
-    [[nodiscard]] std::shared_ptr<const BundleRecord> bundleRecordForIdentifier(
+    void enumerateApplications(ApplicationKind kind, const RecordBlock& block) override;
+    std::shared_ptr<const BundleRecord> proxyFor(const URL& url,
+                                                 URLRelationship relationship) override;
+    std::shared_ptr<const BundleRecord> bundleRecordForIdentifier(
         std::string_view bundleIdentifier) override;
-    [[nodiscard]] std::vector<URL> documentFolders() override;
+    // Null: no record was ever archived.
+    std::shared_ptr<const BundleRecord> unarchivedRecord(
+        const ArchivedBundleRecord& record) override;
+    std::optional<PropertyListDictionary> infoValuesForKeys(
+        const BundleRecord& record, std::span<const std::string_view> keys) override;
 };
 
 }  // namespace marrowdale::native

@@ -5,13 +5,14 @@
 namespace marrowdale::native {
 namespace {
 
-TEST(NoApplicationsTest, knowsNoApplicationAndServesNoDocumentsFolder) {
+TEST(NoApplicationsTest, knowsNoApplication) {
     NoApplications applications;
     EXPECT_EQ(applications.proxyFor(URL::fileURL("/home/u/.var/app/org.example.Notes/Documents"),
                                     URLRelationship::same),
               nullptr);
     EXPECT_EQ(applications.bundleRecordForIdentifier("org.example.Notes"), nullptr);
-    EXPECT_TRUE(applications.documentFolders().empty());
+    applications.enumerateApplications(ApplicationKind::user, [](const auto&) { FAIL(); });
+    applications.enumerateApplications(ApplicationKind::system, [](const auto&) { FAIL(); });
 }
 
 }  // namespace

@@ -17,6 +17,7 @@
 #include "providers/marrowdale/items/FileSystemAccess.h"
 #include "providers/marrowdale/items/ItemLookup.h"
 #include "providers/marrowdale/items/LocalItem.h"
+#include "tests/support/AddedLibraries.h"
 #include "tests/support/TestWorld.h"
 
 namespace marrowdale {
@@ -29,7 +30,8 @@ class ActionsTest : public ::testing::TestWithParam<TestFileSystem> {
 
     ActionsTest() {
         makeFolder(directory_.path("app/Documents"));
-        world_.applications.add("org.example.Notes", "Notes", directory_.path("app"));
+        addLibrary(world_.platform, world_.applications, "org.example.Notes", "Notes",
+                   directory_.path("app"));
     }
 
     [[nodiscard]] std::string path(std::string_view name) const {

@@ -1,5 +1,6 @@
 #include <cerrno>
 
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/actions/ActionsTestWorld.h"
 #include "providers/marrowdale/actions/ItemActions.h"
 #include "providers/marrowdale/items/ProviderError.h"
@@ -218,16 +219,7 @@ TEST_P(ItemActionsTest, theSectionClosesBeforeTheAnswer) {
       private:
         FileOperations::URLHandler& kept_;
     } keeping(world_.fileOperations, kept);
-    const Platform platform{.log = platform_.log,
-                            .fileSystem = platform_.fileSystem,
-                            .extendedAttributes = platform_.extendedAttributes,
-                            .writeAccess = platform_.writeAccess,
-                            .fileOperations = keeping,
-                            .generationStore = platform_.generationStore,
-                            .fileEvents = platform_.fileEvents,
-                            .applications = platform_.applications,
-                            .manager = platform_.manager,
-                            .shared = platform_.shared};
+    const Platform platform = withFileOperations(platform_, keeping);
     bool answered = false;
     createDirectory(platform, "new", folder, [&](const Item&) { answered = true; });
     EXPECT_FALSE(answered);

@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 
 #include "platform/testing/ForwardingExtendedAttributes.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/actions/ActionsTestWorld.h"
 #include "providers/marrowdale/actions/MetadataActions.h"
 #include "providers/marrowdale/items/ItemMetadata.h"
@@ -44,16 +45,7 @@ class MetadataActionsTest : public ActionsTest {
     const Platform& platform() const { return refuses_ ? refusing_ : platform_; }
 
     RefusingAttributes refusingAttributes_{world_.attributes};
-    const Platform refusing_{.log = platform_.log,
-                             .fileSystem = platform_.fileSystem,
-                             .extendedAttributes = refusingAttributes_,
-                             .writeAccess = platform_.writeAccess,
-                             .fileOperations = platform_.fileOperations,
-                             .generationStore = platform_.generationStore,
-                             .fileEvents = platform_.fileEvents,
-                             .applications = platform_.applications,
-                             .manager = platform_.manager,
-                             .shared = platform_.shared};
+    const Platform refusing_ = withExtendedAttributes(platform_, refusingAttributes_);
     bool refuses_ = false;
     const std::string library_ = "#org.example.Notes";
     const std::string nothing_ = "did=4294967295";

@@ -2,6 +2,7 @@
 #include <sys/stat.h>
 
 #include "platform/testing/ForwardingExtendedAttributes.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/actions/ActionsTestWorld.h"
 #include "providers/marrowdale/actions/TrashActions.h"
 #include "providers/marrowdale/items/PutBack.h"
@@ -83,7 +84,7 @@ TEST_P(TrashActionsTest, aPutBackThatHasNoStringIsLoggedWithoutTheLastBracket) {
     makeFolder(path("app:inner/Documents"));
     const std::string item = made("app:inner/Documents/a");
     // The same folder by name, once "." is taken out, and other components.
-    world_.applications.add("org.example.Odd", "Odd", path("app:inner/."));
+    addLibrary(world_.platform, world_.applications, "org.example.Odd", "Odd", path("app:inner/."));
     const auto library = appLibraryItemHolding(platform_, url("app:inner/Documents/a"));
     ASSERT_TRUE(library);
     ASSERT_EQ(library->itemIdentifier, "#org.example.Odd");
@@ -173,16 +174,7 @@ TEST_P(TrashActionsTest, attributesThatCanNotBeWrittenAreLoggedAlone) {
             return Unexpected(errorWithPOSIXCode(EIO));
         }
     } refusing(world_.attributes);
-    const Platform platform{.log = platform_.log,
-                            .fileSystem = platform_.fileSystem,
-                            .extendedAttributes = refusing,
-                            .writeAccess = platform_.writeAccess,
-                            .fileOperations = platform_.fileOperations,
-                            .generationStore = platform_.generationStore,
-                            .fileEvents = platform_.fileEvents,
-                            .applications = platform_.applications,
-                            .manager = platform_.manager,
-                            .shared = platform_.shared};
+    const Platform platform = withExtendedAttributes(platform_, refusing);
     auto answer = answerTo([&](auto handler) { trashItem(platform, item, handler); });
     ASSERT_TRUE(answer);
     const std::string location = url("app:.Trash/a").absoluteString();

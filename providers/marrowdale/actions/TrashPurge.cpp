@@ -12,10 +12,10 @@
 #include "providers/marrowdale/actions/TrashActions.h"
 #include "providers/marrowdale/actions/TrashAttributes.h"
 #include "providers/marrowdale/fs/FSDirectoryEnumerator.h"
-#include "providers/marrowdale/items/AppLibraryOfURL.h"
 #include "providers/marrowdale/items/FileSystemAccess.h"
 #include "providers/marrowdale/items/ItemLookup.h"
 #include "providers/marrowdale/items/ItemMetadata.h"
+#include "providers/marrowdale/items/MRWAppLibraryManager.h"
 
 namespace marrowdale {
 
@@ -42,7 +42,7 @@ class Deletions {
 };
 
 std::vector<URL> trashFolders(const Platform& platform) {
-    std::vector<URL> folders = appLibraryFolders(platform);
+    std::vector<URL> folders = MRWAppLibraryManager::rootURLsForAppLibraries(platform);
     folders.push_back(platform.manager.documentStorageURL());
     for (URL& folder : folders) {
         folder = folder.appendingPathComponent(trashFolderName);

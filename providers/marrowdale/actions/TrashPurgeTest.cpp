@@ -2,6 +2,7 @@
 #include <future>
 
 #include "platform/testing/ForwardingExtendedAttributes.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/actions/ActionsTestWorld.h"
 #include "providers/marrowdale/actions/TrashPurge.h"
 #include "providers/marrowdale/items/ItemMetadata.h"
@@ -180,16 +181,7 @@ TEST_P(TrashPurgeTest, theHostIsToldAfterTheLastDeletion) {
       private:
         ErrorHandler& kept_;
     } keeping(world_.fileOperations, kept);
-    const Platform platform{.log = platform_.log,
-                            .fileSystem = platform_.fileSystem,
-                            .extendedAttributes = platform_.extendedAttributes,
-                            .writeAccess = platform_.writeAccess,
-                            .fileOperations = keeping,
-                            .generationStore = platform_.generationStore,
-                            .fileEvents = platform_.fileEvents,
-                            .applications = platform_.applications,
-                            .manager = platform_.manager,
-                            .shared = platform_.shared};
+    const Platform platform = withFileOperations(platform_, keeping);
     std::promise<void> done;
     auto told = done.get_future();
     removeTrashedItemsOlderThan(platform, reference_, [&] { done.set_value(); });

@@ -4,6 +4,7 @@
 #include <set>
 
 #include "platform/testing/EmptyFileSystem.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/fs/FSChangesEnumeratorTestWorld.h"
 #include "providers/marrowdale/fs/FSWalkCursors.h"
 
@@ -315,9 +316,7 @@ class FullDiskFileSystem : public ForwardingFileSystem {
 TEST_P(FSChangesEnumeratorScanTest, aFolderThatCantBeReadAsAWholeEndsTheRequestWithTheError) {
     makeMovedFolder(3);
     FullDiskFileSystem files(world_.fileSystem);
-    const Platform full{world_.log,          files,          world_.attributes,
-                        world_.writeAccess,  *world_.store,  passes_,
-                        world_.applications, world_.manager, world_.shared};
+    const Platform full = withFileSystem(platform_, files);
     observer_ = std::make_shared<CollectingChangeObserver>();
     passes_.pathHistory = {gone("a", FileID{5}), *moved_, done()};
     enumerator_ = FSChangesEnumerator::make(full, token_, std::string(workingSet),

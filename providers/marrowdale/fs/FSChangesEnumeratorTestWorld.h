@@ -8,6 +8,7 @@
 
 #include "platform/hostframework/FileProviderConstants.h"
 #include "platform/testing/CollectingChangeObserver.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/fs/FSChangesEnumerator.h"
 #include "providers/marrowdale/fs/FSEventReaderTestWorld.h"
 #include "providers/marrowdale/fs/FSRetiredReaders.h"
@@ -121,9 +122,7 @@ class FSChangesEnumeratorTestWorld : public FSEventReaderTestWorld {
     }
 
     PassEvents passes_;
-    const Platform platform_{world_.log,          world_.fileSystem, world_.attributes,
-                             world_.writeAccess,  *world_.store,     passes_,
-                             world_.applications, world_.manager,    world_.shared};
+    const Platform platform_ = withFileEvents(world_.platform, passes_);
     FSChangeToken token_;
     std::function<void(const std::string&)> within_;
     std::shared_ptr<CollectingChangeObserver> observer_;

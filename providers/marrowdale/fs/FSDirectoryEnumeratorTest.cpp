@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/testing/FakePlatform.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/fs/FSDirectoryEnumerator.h"
 
 namespace marrowdale {
@@ -111,9 +112,7 @@ class FSDirectoryEnumeratorTest : public ::testing::Test {
 
     FakePlatform fake_;
     FakeFolders files_;
-    Platform platform_{
-        fake_.log,   files_,       fake_.attributes,   fake_.writeAccess, fake_.fileOperations,
-        fake_.store, fake_.events, fake_.applications, fake_.manager,     fake_.shared};
+    Platform platform_ = withFileSystem(fake_.platform, files_);
     std::vector<URL> collected_;
 };
 

@@ -47,7 +47,7 @@ TEST_P(FSEventReaderEventsTest, anItemIsMadeAnewForEachEvent) {
 TEST_P(FSEventReaderEventsTest, itemsCarryTheBundleIdentifierOfTheirLibrary) {
     makeFolder(world_.path("app/Documents"));
     writeFile(world_.path("app/Documents/a"), "");
-    world_.applications.add("org.example.Notes", "Notes", world_.path("app"));
+    world_.addLibrary("org.example.Notes", "Notes", world_.path("app"));
     tell({event("app/Documents/a", FileEventFlag::changed)});
     ASSERT_EQ(delegate_->items.size(), 1U);
     EXPECT_EQ(delegate_->items[0]->hx_lumenoDomainIdentifier, "org.example.Notes");

@@ -8,6 +8,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/testing/FakeFileEventService.h"
+#include "platform/testing/PlatformVariants.h"
 #include "platform/testing/TestFileSystems.h"
 #include "platform/testing/TestFiles.h"
 #include "providers/marrowdale/fs/FSEventReader.h"
@@ -104,16 +105,7 @@ class FSEventReaderTestWorld : public ::testing::TestWithParam<TestFileSystem> {
     TemporaryDirectory directory_{GetParam().dir};
     TestWorld world_{directory_};
     FakeFileEventService events_;
-    const Platform platform_{world_.log,
-                             world_.fileSystem,
-                             world_.attributes,
-                             world_.writeAccess,
-                             world_.fileOperations,
-                             *world_.store,
-                             events_,
-                             world_.applications,
-                             world_.manager,
-                             world_.shared};
+    const Platform platform_ = withFileEvents(world_.platform, events_);
     std::shared_ptr<RecordingDelegate> delegate_ = std::make_shared<RecordingDelegate>();
     std::shared_ptr<FSEventReader> reader_;
 

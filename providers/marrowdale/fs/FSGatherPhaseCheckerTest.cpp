@@ -105,16 +105,7 @@ TEST_P(FSGatherPhaseCheckerTest, theEventIsReadBeforeTheHistory) {
     } late;
     late.eventID = EventID{40};
     late.history = FakeFileEventService::emptyHistory();
-    const Platform platform{world_.log,
-                            world_.fileSystem,
-                            world_.attributes,
-                            world_.writeAccess,
-                            world_.fileOperations,
-                            *world_.store,
-                            late,
-                            world_.applications,
-                            world_.manager,
-                            world_.shared};
+    const Platform platform = withFileEvents(world_.platform, late);
     EXPECT_EQ(FSEventReader::canResumeGatherPhase(platform, {world_.url("")}, EventID{10})->eventID,
               EventID{40});
 }

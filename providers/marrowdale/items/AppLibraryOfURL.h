@@ -1,15 +1,11 @@
 #pragma once
 
 #include <memory>
-#include <vector>
 
 #include "platform/Platform.h"
 #include "providers/marrowdale/items/LocalAppLibraryItem.h"
 
 namespace marrowdale {
-
-// The documents folders of the known app libraries, in a lasting order.
-[[nodiscard]] std::vector<URL> appLibraryFolders(const Platform& platform);
 
 // The item of the app library that holds the URL: of the documents folders that contain it, or are
 // it, the one with the longest path. Null when none does, or its item can't be made.

@@ -121,6 +121,22 @@ TEST_P(LocalAppLibraryItemTest, aFileOrLinkOfAHiddenNameIsNoSubfolder) {
     EXPECT_EQ(item()->childItemCount, 1U);
 }
 
+TEST_P(LocalAppLibraryItemTest, theItemsInItFindIt) {
+    makeFolder(documents("Work"));
+    writeFile(documents("Work/a"), "");
+    writeFile(world_.path("elsewhere"), "");
+    world_.addLibrary("org.example.Other", "Other", directory_.path("other"));
+    const auto found = [&](const std::string& path) {
+        const auto library = LocalItem::initWithURL(world_.platform, URL::fileURL(path))
+                                 ->fetchAppLibraryItem(world_.platform);
+        return library ? library->itemIdentifier : "none";
+    };
+    EXPECT_EQ(found(documents("Work/a")), "#org.example.Notes");
+    EXPECT_EQ(found(documents("Work")), "#org.example.Notes");
+    EXPECT_EQ(found(world_.path("elsewhere")), "none");
+    EXPECT_EQ(item()->fetchAppLibraryItem(world_.platform), nullptr);
+}
+
 TEST_P(LocalAppLibraryItemTest, hasNoLastUsedDate) {
     if (!keepsUserAttributes(documents())) {
         MARROWDALE_SKIP("the file system keeps no user attributes");

@@ -7,8 +7,10 @@
 
 #include "platform/foundation/FatalError.h"
 #include "platform/hostframework/FileProviderConstants.h"
+#include "providers/marrowdale/items/AppLibraryOfURL.h"
 #include "providers/marrowdale/items/FileSystemAccess.h"
 #include "providers/marrowdale/items/ItemForIdentifier.h"
+#include "providers/marrowdale/items/LocalAppLibraryItem.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 #include "providers/marrowdale/items/ParentFolderCache.h"
 #include "providers/marrowdale/items/PutBack.h"
@@ -66,6 +68,14 @@ std::shared_ptr<LocalItem> LocalItem::initWithURL(const Platform& platform, cons
 std::shared_ptr<LocalItem> LocalItem::initWithFileIdentifier(const Platform& platform,
                                                              std::string_view identifier) {
     return itemForIdentifierString(platform, identifier);
+}
+
+std::shared_ptr<LocalAppLibraryItem> LocalItem::fetchAppLibraryItem(
+    const Platform& platform) const {
+    if (hx_isContainer()) {
+        return nullptr;
+    }
+    return appLibraryItemHolding(platform, fileURL);
 }
 
 bool LocalItem::initialise(const Platform& platform, const Options& options,

@@ -12,6 +12,7 @@
 
 namespace marrowdale {
 
+class LocalAppLibraryItem;
 class ParentFolderCache;
 
 // The record of a file or folder that the provider serves. Everything is read when it is made;
@@ -65,6 +66,10 @@ class LocalItem : public FileProviderItem {
     // Not for several threads at once.
     [[nodiscard]] std::optional<URL> putBackURL(const Platform& platform);
     void setPutBackURL(std::optional<URL> url) { putBackURL_ = std::move(url); }
+    // The item of the app library that holds this one; null when none does, and for the item of an
+    // app library itself.
+    [[nodiscard]] std::shared_ptr<LocalAppLibraryItem> fetchAppLibraryItem(
+        const Platform& platform) const;
 
     [[nodiscard]] const std::string& itemIdentifierAsString() const { return itemIdentifier; }
     [[nodiscard]] const std::string& parentItemIdentifierAsString() const {

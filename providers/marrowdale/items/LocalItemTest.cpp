@@ -168,7 +168,7 @@ TEST_P(LocalItemTest, anInboxFolderDirectlyInTheRootIsRefused) {
 
 TEST_P(LocalItemTest, anInboxFolderInAnAppLibraryIsRefused) {
     makeFolder(directory_.path("app/Documents/Inbox"));
-    world_.applications.add("org.example.Notes", "Notes", directory_.path("app"));
+    world_.addLibrary("org.example.Notes", "Notes", directory_.path("app"));
     EXPECT_FALSE(LocalItem::initWithURL(world_.platform,
                                         URL::fileURL(directory_.path("app/Documents/Inbox"))));
     EXPECT_EQ(count("[DEBUG] can't create an item for the \"Inbox\" directory"), 1U);
@@ -430,8 +430,8 @@ TEST_P(LocalItemTest, theDomainIsTheBundleIdentifierOfTheInnermostLibrary) {
     makeFolder(directory_.path("app/Documents/inner/Documents"));
     writeFile(directory_.path("app/Documents/a.txt"), "");
     writeFile(directory_.path("app/Documents/inner/Documents/a.txt"), "");
-    world_.applications.add("org.example.Outer", "Outer", directory_.path("app"));
-    world_.applications.add("org.example.Inner", "Inner", directory_.path("app/Documents/inner"));
+    world_.addLibrary("org.example.Outer", "Outer", directory_.path("app"));
+    world_.addLibrary("org.example.Inner", "Inner", directory_.path("app/Documents/inner"));
     const auto domain = [&](const std::string& path, bool flag) {
         const LocalItem::Options options{.customItemID = "did=1",
                                          .customParentItemID = "fid=2",

@@ -13,6 +13,7 @@
 
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/items/FileSystemAccess.h"
+#include "providers/marrowdale/items/MRWAppLibraryManager.h"
 #include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
 
 namespace marrowdale {
@@ -33,7 +34,7 @@ struct Place {
 };
 
 Place placeInAppLibraries(const Platform& platform, const URL& url) {
-    for (const URL& folder : platform.applications.documentFolders()) {
+    for (const URL& folder : MRWAppLibraryManager::rootURLsForAppLibraries(platform)) {
         switch (relationship(folder, url)) {
             case URLRelationship::contains:
                 return {.isServed = true, .identifier = {}};

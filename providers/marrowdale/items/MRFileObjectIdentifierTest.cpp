@@ -7,6 +7,7 @@
 #include "platform/testing/FakePlatform.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 #include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
+#include "tests/support/AddedLibraries.h"
 
 namespace marrowdale {
 namespace {
@@ -87,13 +88,13 @@ TEST_F(MRFileObjectIdentifierTest, theStorageRootItselfYieldsTheRootIdentifier) 
 }
 
 TEST_F(MRFileObjectIdentifierTest, anAppLibraryFolderItselfYieldsItsBundleIdentifier) {
-    fake_.applications.add("org.example.Notes", "Notes", "/apps/notes");
+    addLibrary(fake_.platform, fake_.applications, "org.example.Notes", "Notes", "/apps/notes");
     EXPECT_EQ(identifierOf("/apps/notes/Documents"), "#org.example.Notes");
 }
 
 TEST_F(MRFileObjectIdentifierTest, aFileInsideAnAppLibraryYieldsADocumentIdentifier) {
-    fake_.applications.add("org.example.Other", "Other", "/apps/other");
-    fake_.applications.add("org.example.Notes", "Notes", "/apps/notes");
+    addLibrary(fake_.platform, fake_.applications, "org.example.Other", "Other", "/apps/other");
+    addLibrary(fake_.platform, fake_.applications, "org.example.Notes", "Notes", "/apps/notes");
     isDirectory(false);
     set(ResourceKey::documentIdentifier, number(12));
     EXPECT_EQ(identifierOf("/apps/notes/Documents/a.txt"), "did=12");

@@ -4,6 +4,8 @@
 #include <utility>
 #include <vector>
 
+#include "providers/marrowdale/items/MRWAppLibraryManager.h"
+
 namespace marrowdale {
 
 namespace {
@@ -17,7 +19,7 @@ bool isTopInFolder(const URL& top, const URL& folder) {
 }
 
 bool folderHoldsOrdinaryItems(const Platform& platform, const URL& folder) {
-    std::vector<URL> tops = platform.applications.documentFolders();
+    std::vector<URL> tops = MRWAppLibraryManager::rootURLsForAppLibraries(platform);
     tops.push_back(platform.manager.documentStorageURL());
     return std::ranges::any_of(tops, [&](const URL& top) { return holds(top, folder); }) &&
            std::ranges::none_of(tops, [&](const URL& top) { return isTopInFolder(top, folder); });
@@ -38,14 +40,7 @@ ParentFolderCache::Facts& ParentFolderCache::factsFor(const URL& folder) {
 
 std::optional<std::string> bundleIdentifierOfLibraryWithURL(const Platform& platform,
                                                             const URL& url) {
-    std::vector<URL> folders = platform.applications.documentFolders();
-    std::erase_if(folders, [&](const URL& folder) { return !holds(folder, url); });
-    const auto longest = std::ranges::max_element(
-        folders, {}, [](const URL& folder) { return folder.standardized().path().size(); });
-    if (longest == folders.end()) {
-        return std::nullopt;
-    }
-    const auto record = platform.applications.proxyFor(*longest, URLRelationship::same);
+    const auto record = MRWAppLibraryManager::recordOfLibraryHolding(platform, url);
     return record ? record->bundleIdentifier() : std::nullopt;
 }
 

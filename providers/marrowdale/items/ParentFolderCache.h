@@ -32,8 +32,8 @@ class ParentFolderCache {
     std::optional<Facts> facts_;  // of the folder asked for last
 };
 
-// The bundle identifier of the application whose library holds the URL: of the folders that contain
-// it, or are it, the one with the longest path. None when no library holds it.
+// The bundle identifier of the application whose library holds the URL; see
+// MRWAppLibraryManager::recordOfLibraryHolding. None when no library holds it.
 [[nodiscard]] std::optional<std::string> bundleIdentifierOfLibraryWithURL(const Platform& platform,
                                                                           const URL& url);
 
