@@ -68,7 +68,7 @@ TESTS_OF = {
     "host": ["host/testing", "platform/linux", "platform/hostframework"],
 }
 
-# The files outside SYSTEM that may include a header of the system, with the reason.
+# The files outside SYSTEM and LIBRARIES that may include one of their headers, with the reason.
 EXCEPTIONS = {
     # What somebody else writes, who has the library installed.
     "client/example/follow.cpp": {"marrowdale/client.h"},
@@ -134,7 +134,7 @@ def complaint(path, layer, bracket, header):
     if SYSTEM_HEADER.match(header):
         allowed = is_test(path) or within(path, SYSTEM) or header in EXCEPTIONS.get(path, {})
         return None if allowed else f"<{header}> is a header of the system"
-    allowed = within(path, LIBRARIES)
+    allowed = within(path, LIBRARIES) or header in EXCEPTIONS.get(path, {})
     return None if allowed else f"<{header}> is no header of the standard library"
 
 

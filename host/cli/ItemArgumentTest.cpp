@@ -35,6 +35,7 @@ class ItemArgumentTest : public ::testing::Test {
                              .signals = signals_,
                              .rootPath = root_,
                              .replicaPath = ":memory:",
+                             .stateFolder = {},
                              .findings = [] { return std::vector<Finding>{}; }}};
 };
 
