@@ -38,7 +38,7 @@ class LocalAppLibraryItemTest : public ::testing::TestWithParam<TestFileSystem> 
     }
 
     TemporaryDirectory directory_{GetParam().dir};
-    TestWorld world_{directory_};
+    TestWorld world_{directory_, {}, TestWorld::Serving::wholeDirectory};
     std::shared_ptr<FakeBundleRecord> record_;
 };
 
