@@ -137,6 +137,7 @@ TEST_F(LocalActionsTest, aPurgeForgetsWhatIsNoLongerInTheTrash) {
     ASSERT_TRUE(parents.remember("did=1", "fid=2"));
     ASSERT_TRUE(parents.remember("did=77", "fid=2"));
     trash(true);
+    extension_.items["did=1"]->fileURL = URL::fileURL(state_.path() + "/gone");
     ASSERT_TRUE(perform(action(Kind::purge, "")));
     // Neither is there any more: one is gone from the trash, the other was never known.
     EXPECT_TRUE(parents.items().empty());

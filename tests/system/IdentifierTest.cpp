@@ -109,7 +109,7 @@ TEST_P(IdentifierTest, whatTheProviderDoesNotServeHasNoIdentifier) {
         const Json error = home_.error({"id", "--", path}, 1);
         EXPECT_EQ(error["name"], "noSuchItem") << path;
         EXPECT_EQ(error["path"], path);
-        EXPECT_FALSE(error.contains("itemIdentifier")) << path;
+        EXPECT_EQ(error["itemIdentifier"], path);
     }
 }
 

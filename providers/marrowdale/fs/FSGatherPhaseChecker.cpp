@@ -10,7 +10,8 @@ void FSGatherPhaseChecker::fsEventReaderDidChangeItem(const std::shared_ptr<Loca
 void FSGatherPhaseChecker::fsEventReaderDidDeleteItem(const std::string& /*identifier*/,
                                                       const std::string& path,
                                                       const FileEvent& /*event*/) {
-    if (gatherPhaseResumeStatus.kind != Status::Kind::cantReplayHistoricalFSEvents) {
+    // The first: of a document that was moved out of sight both places are told.
+    if (gatherPhaseResumeStatus.kind == Status::Kind::canResume) {
         gatherPhaseResumeStatus = Status::deletionOccurred(path);
     }
 }

@@ -47,7 +47,7 @@ TEST_P(FSGatherPhaseCheckerTest, aDeletionForbidsItAndSaysWhere) {
     EXPECT_EQ(statusAfter({{gone("a", FileID{5}, 7)}, {done()}}),
               Status::deletionOccurred(world_.path("a")));
     EXPECT_EQ(statusAfter({{gone("a", FileID{5}), gone("b", FileID{6}), done()}}),
-              Status::deletionOccurred(world_.path("b")));
+              Status::deletionOccurred(world_.path("a")));
 }
 
 TEST_P(FSGatherPhaseCheckerTest, aDeletionOutOfSightDoesNot) {
