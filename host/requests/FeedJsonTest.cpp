@@ -68,10 +68,9 @@ TEST(FeedJsonTest, pagesChangesAndAnchorsComeBackAsTheyWereWritten) {
 }
 
 TEST(FeedJsonTest, whatIsNoAnswerIsNotUnderstood) {
-    for (const char* text :
-         {"", "[]", "{}", "7", R"({"items":[{}],"nextPage":null})", R"({"items":7})",
-          R"({"updated":[],"deleted":[1],"moreComing":false})",
-          R"({"findings":[{"finding":"a","status":"odd","message":""}]})"}) {
+    for (const char* text : {"", "[]", "{}", "7", R"({"items":[{}],"nextPage":null})",
+                             R"({"items":7})", R"({"updated":[],"deleted":[1],"moreComing":false})",
+                             R"({"findings":[{"finding":"a","status":"odd","message":""}]})"}) {
         EXPECT_EQ(itemFromJson(text).error().code, EPROTO) << text;
         EXPECT_EQ(pageFromJson(text).error().code, EPROTO) << text;
         EXPECT_EQ(changesFromJson(text).error().code, EPROTO) << text;

@@ -206,20 +206,11 @@ TEST_F(LocalAppLibraryManagerTest, anotherWorldBeginsWithWhatTheCachesHold) {
     });
     SharedObjects others;
     const Platform& p = world_.platform;
-    const Platform other{p.log,
-                         p.fileSystem,
-                         p.extendedAttributes,
-                         p.writeAccess,
-                         p.fileOperations,
-                         p.generationStore,
-                         p.fileEvents,
-                         p.applications,
-                         p.manager,
-                         others,
-                         p.applicationSupport,
-                         p.deviceInformation,
-                         p.icons,
-                         p.imageEncoder};
+    const Platform other{p.log,         p.fileSystem,         p.extendedAttributes,
+                         p.writeAccess, p.fileOperations,     p.generationStore,
+                         p.fileEvents,  p.applications,       p.manager,
+                         others,        p.applicationSupport, p.deviceInformation,
+                         p.icons,       p.imageEncoder};
     const LocalAppLibraryManager& second = LocalAppLibraryManager::shared(other);
     EXPECT_NE(&second, &shared());
     EXPECT_EQ(second.versionToken(), 1U);
