@@ -119,6 +119,9 @@ class World::Parts {
     }
 
     WorldOptions options_;
+    // Goes last: caches below keep what the extension derived from attributes, and to let go of
+    // that takes its code.
+    std::unique_ptr<ExtensionModule> module_;
     std::unique_ptr<Log> log_;
     std::unique_ptr<native::Store> store_;
     std::unique_ptr<native::Temporaries> temporaries_;
@@ -140,7 +143,6 @@ class World::Parts {
     native::PNGEncoder imageEncoder_;
     // The store records one tree; applications come when it records theirs beside it.
     native::NoApplications applications_;
-    std::unique_ptr<ExtensionModule> module_;
     // Holds objects of the extension's, whose code is in the module.
     SharedObjects shared_;
     Platform platform_;

@@ -80,6 +80,10 @@ TEST_P(ActionsTest, metadataIsSetAndCleared) {
     }
     const std::string item = made("folder/a");
     EXPECT_EQ(home_.line({"tag", item, "red", "blue"})["tags"], (Json{"red", "blue"}));
+    // What a listing derives from attributes is kept until the end, and let go of in order.
+    const std::vector<Json> listed = home_.lines({"ls", home_.document("folder")});
+    ASSERT_EQ(listed.size(), 1U);
+    EXPECT_EQ(listed.front()["tags"], (Json{"red", "blue"}));
     EXPECT_EQ(home_.line({"tag", item}).value("tags", Json::array()), Json::array());
     EXPECT_EQ(home_.line({"favorite", item, "18446744073709551615"})["favoriteRank"],
               18446744073709551615ULL);
