@@ -98,5 +98,5 @@ our_sources() {
     for pattern in "$@"; do
         names+=(${names[@]:+-o} -name "$pattern")
     done
-    find platform providers host tests benchmarks fuzz \( "${names[@]}" \) -type f | sort
+    find platform providers host client tests benchmarks fuzz \( "${names[@]}" \) -type f | sort
 }
