@@ -42,9 +42,9 @@ void limitThisProcess() {
         const rlimit both{value, value};
         (void)::setrlimit(resource, &both);
     };
-#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)  // they reserve far more
-    limit(RLIMIT_AS, memoryBytes);
-#endif
+    if constexpr (MARROWDALE_IS_SANITIZED == 0) {  // sanitizers reserve far more
+        limit(RLIMIT_AS, memoryBytes);
+    }
     limit(RLIMIT_CPU, processorSeconds);
     limit(RLIMIT_FSIZE, 0);
     limit(RLIMIT_CORE, 0);
