@@ -6,14 +6,26 @@ namespace marrowdale {
 
 // A platform with another service in one place, for tests that script that one alone.
 
-[[nodiscard]] inline Platform withFileSystem(const Platform& from, FileSystem& fileSystem) {
+// The services that are to be others; null for those that stay.
+struct OtherServices {
+    FileSystem* fileSystem = nullptr;
+    ExtendedAttributes* extendedAttributes = nullptr;
+    FileOperations* fileOperations = nullptr;
+    GenerationStore* generationStore = nullptr;
+    FileEventService* fileEvents = nullptr;
+};
+
+[[nodiscard]] inline Platform withServices(const Platform& from, const OtherServices& others) {
+    const auto chosen = []<typename Service>(Service* other, Service& present) -> Service& {
+        return other != nullptr ? *other : present;
+    };
     return {.log = from.log,
-            .fileSystem = fileSystem,
-            .extendedAttributes = from.extendedAttributes,
+            .fileSystem = chosen(others.fileSystem, from.fileSystem),
+            .extendedAttributes = chosen(others.extendedAttributes, from.extendedAttributes),
             .writeAccess = from.writeAccess,
-            .fileOperations = from.fileOperations,
-            .generationStore = from.generationStore,
-            .fileEvents = from.fileEvents,
+            .fileOperations = chosen(others.fileOperations, from.fileOperations),
+            .generationStore = chosen(others.generationStore, from.generationStore),
+            .fileEvents = chosen(others.fileEvents, from.fileEvents),
             .applications = from.applications,
             .manager = from.manager,
             .shared = from.shared,
@@ -23,73 +35,21 @@ namespace marrowdale {
             .imageEncoder = from.imageEncoder};
 }
 
-[[nodiscard]] inline Platform withGenerationStore(const Platform& from, GenerationStore& store) {
-    return {.log = from.log,
-            .fileSystem = from.fileSystem,
-            .extendedAttributes = from.extendedAttributes,
-            .writeAccess = from.writeAccess,
-            .fileOperations = from.fileOperations,
-            .generationStore = store,
-            .fileEvents = from.fileEvents,
-            .applications = from.applications,
-            .manager = from.manager,
-            .shared = from.shared,
-            .applicationSupport = from.applicationSupport,
-            .deviceInformation = from.deviceInformation,
-            .icons = from.icons,
-            .imageEncoder = from.imageEncoder};
+[[nodiscard]] inline Platform withFileSystem(const Platform& from, FileSystem& service) {
+    return withServices(from, {.fileSystem = &service});
 }
-
-[[nodiscard]] inline Platform withFileEvents(const Platform& from, FileEventService& fileEvents) {
-    return {.log = from.log,
-            .fileSystem = from.fileSystem,
-            .extendedAttributes = from.extendedAttributes,
-            .writeAccess = from.writeAccess,
-            .fileOperations = from.fileOperations,
-            .generationStore = from.generationStore,
-            .fileEvents = fileEvents,
-            .applications = from.applications,
-            .manager = from.manager,
-            .shared = from.shared,
-            .applicationSupport = from.applicationSupport,
-            .deviceInformation = from.deviceInformation,
-            .icons = from.icons,
-            .imageEncoder = from.imageEncoder};
-}
-
-[[nodiscard]] inline Platform withFileOperations(const Platform& from, FileOperations& service) {
-    return {.log = from.log,
-            .fileSystem = from.fileSystem,
-            .extendedAttributes = from.extendedAttributes,
-            .writeAccess = from.writeAccess,
-            .fileOperations = service,
-            .generationStore = from.generationStore,
-            .fileEvents = from.fileEvents,
-            .applications = from.applications,
-            .manager = from.manager,
-            .shared = from.shared,
-            .applicationSupport = from.applicationSupport,
-            .deviceInformation = from.deviceInformation,
-            .icons = from.icons,
-            .imageEncoder = from.imageEncoder};
-}
-
 [[nodiscard]] inline Platform withExtendedAttributes(const Platform& from,
                                                      ExtendedAttributes& service) {
-    return {.log = from.log,
-            .fileSystem = from.fileSystem,
-            .extendedAttributes = service,
-            .writeAccess = from.writeAccess,
-            .fileOperations = from.fileOperations,
-            .generationStore = from.generationStore,
-            .fileEvents = from.fileEvents,
-            .applications = from.applications,
-            .manager = from.manager,
-            .shared = from.shared,
-            .applicationSupport = from.applicationSupport,
-            .deviceInformation = from.deviceInformation,
-            .icons = from.icons,
-            .imageEncoder = from.imageEncoder};
+    return withServices(from, {.extendedAttributes = &service});
+}
+[[nodiscard]] inline Platform withFileOperations(const Platform& from, FileOperations& service) {
+    return withServices(from, {.fileOperations = &service});
+}
+[[nodiscard]] inline Platform withGenerationStore(const Platform& from, GenerationStore& service) {
+    return withServices(from, {.generationStore = &service});
+}
+[[nodiscard]] inline Platform withFileEvents(const Platform& from, FileEventService& service) {
+    return withServices(from, {.fileEvents = &service});
 }
 
 }  // namespace marrowdale
