@@ -123,6 +123,7 @@ class TreeChanges {
     void noteOtherNamesBelow(RowNumber folder);
     // It is not there any more; perhaps it was moved.
     void tellGone(RowNumber number, const Told& told);
+    void tellOutOfSight(RowNumber number, const Told& told);
     // It is nowhere any more. The row is about to be freed.
     void tellRemoved(RowNumber number, const Told& told);
     void putGoneDocument(const std::string& path, std::uint32_t document);

@@ -95,6 +95,7 @@ void TreeChanges::flushMove(RowNumber number, const Told& told, const Place& now
         putBelow(number, told.place.path, Side::gone, false);
     }
     if (now.package != noRow) {
+        tellOutOfSight(number, told);
         packagesChanged_.push_back(now.package);
         return;
     }
@@ -106,6 +107,16 @@ void TreeChanges::flushMove(RowNumber number, const Told& told, const Place& now
          .path = now.path});
     if (isOpen && !wasOpen) {
         putBelow(number, now.path, Side::appeared, false);
+    }
+}
+
+// Nothing is told of what is in a package. Whoever knows the document need not know it by the
+// number of its file, which the event of its old place has: a link is known by that of what it
+// leads to.
+void TreeChanges::tellOutOfSight(RowNumber number, const Told& told) {
+    const std::uint32_t document = index_.row(number).document;
+    if (told.place.package == noRow && document != 0 && !hasServedName(document)) {
+        putGoneDocument(told.place.path, document);
     }
 }
 

@@ -234,6 +234,26 @@ TEST_F(TreeChangesTest, AGoneDocumentInAPackageIsToldAtThePackage) {
     EXPECT_THAT(commit(), ElementsAre("gone a.bundle (did=5)"));
 }
 
+// Whoever knows a link knows it by the number of what it leads to.
+TEST_F(TreeChangesTest, WhatMovesIntoAPackageIsADocumentNoMore) {
+    const RowNumber package = addFolder(rootRow, "a.bundle", 10);
+    const RowNumber file = addFile(rootRow, "file", 11);
+    index().setDocument(file, 5);
+    move(file, package, "file");
+    EXPECT_THAT(commit(), ElementsAre("gone+renamed file, file 11", "gone file (did=5)",
+                                      "changed a.bundle, file 10"));
+}
+
+TEST_F(TreeChangesTest, WhatMovesIntoAPackageAndHasANameOutsideStaysADocument) {
+    const RowNumber package = addFolder(rootRow, "a.bundle", 10);
+    const RowNumber file = addLink(rootRow, "file", 11);
+    index().setDocument(file, 5);
+    index().setDocument(addLink(rootRow, "other", 11), 5);
+    move(file, package, "file");
+    EXPECT_THAT(commit(), ElementsAre("gone+renamed file, file 11", "changed a.bundle, file 10",
+                                      "changed other, file 11"));
+}
+
 TEST_F(TreeChangesTest, APackageThatWasChangedAndCameIntoAnother) {
     const RowNumber outer = addFolder(rootRow, "outer.bundle", 10);
     const RowNumber inner = addFolder(rootRow, "inner.bundle", 11);

@@ -148,6 +148,7 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
                                     const FileEvent& event, const URL& url,
                                     const std::string& identifier) const;
     [[nodiscard]] Place placeOf(const URL& url) const;
+    [[nodiscard]] bool isInPackage(const URL& url) const;
     // At debug level, for a verbose reader.
     template <typename MakeText>
     void logDecision(MakeText&& makeText) const {

@@ -84,13 +84,33 @@ TEST_P(FSEventReaderDocIDTest, theSameLooksAreTakenAtTheResolvedPlace) {
     auto asked = options(FSEventReaderMode::docIDBased);
     asked.urls = {world_.url("in")};
     startReader(asked);
-    tell({movedDocument(documentOf(".Trash/a")), movedDocument(documentOf("out")),
-          movedDocument(documentOf("in/.h")), movedDocument(documentOf("in/b"))});
-    EXPECT_EQ(delegate_->told, Lines{"change b 14"});
+    const Lines documents{documentOf(".Trash/a"), documentOf("out"), documentOf("in/.h")};
+    tell({movedDocument(documents[0]), movedDocument(documents[1]), movedDocument(documents[2]),
+          movedDocument(documentOf("in/b"))});
+    // Whoever knew it at another place is told that it went out of sight.
+    EXPECT_EQ(
+        delegate_->told,
+        (Lines{"delete did=" + documents[0] + " " + world_.path(".Trash/a") + " 11",
+               "delete did=" + documents[1] + " " + world_.path("out") + " 12",
+               "delete did=" + documents[2] + " " + world_.path("in/.h") + " 13", "change b 14"}));
     const std::string dropping = "[DEBUG] dropping fsevent at ";
     EXPECT_EQ(logged(dropping + world_.path(".Trash/a") + "; URL is not monitored"), 1U);
     EXPECT_EQ(logged(dropping + world_.path("out") + "; URL is not monitored"), 1U);
     EXPECT_EQ(logged(dropping + world_.path("in/.h") + "; URL is hidden"), 1U);
+}
+
+TEST_P(FSEventReaderDocIDTest, aDocumentThatCameIntoAPackageIsGone) {
+    writeFile(world_.path("a"), "");
+    const std::string document = documentOf("a");
+    const std::string package = world_.path("p." + native::PackageTypes().extensions().front());
+    makeFolder(package);
+    makeFolder(package + "/in");
+    const std::string inside = package + "/in/a";
+    std::filesystem::rename(world_.path("a"), inside);
+    ASSERT_TRUE(world_.store->reconcile());
+    tell({movedDocument(document)});
+    EXPECT_EQ(delegate_->told, Lines{"delete did=" + document + " " + inside + " 11"});
+    EXPECT_EQ(logged("[DEBUG] dropping fsevent at " + inside + "; URL is not monitored"), 1U);
 }
 
 TEST_P(FSEventReaderDocIDTest, aDocumentWhosePlaceEmptiedMeanwhileIsDroppedOrItsFileGone) {

@@ -176,7 +176,28 @@ bool FSEventReader::handleDocumentPath(const Run& run, FSEventReaderDelegate& de
         logDecision([&] { return "can't compute url for " + marrowdale::description(change); });
         return true;
     }
+    if (isInPackage(*url)) {
+        logDecision(
+            [&] { return "dropping fsevent at " + url->path() + "; URL is not monitored"; });
+        return tellOutOfSight(run, delegate, event, *url);
+    }
     return handleURL(run, delegate, event, *url, Comparison::none);
+}
+
+// What a package holds is no item, though its documents keep their identifiers.
+bool FSEventReader::isInPackage(const URL& url) const {
+    const auto isServed = [this](const URL& folder) {
+        return std::ranges::any_of(urls_, [&](const URL& root) {
+            return relationship(root, folder) == URLRelationship::contains;
+        });
+    };
+    for (URL folder = url.deletingLastPathComponent(); isServed(folder);
+         folder = folder.deletingLastPathComponent()) {
+        if (!hx_isFolder(platform_, folder)) {
+            return true;
+        }
+    }
+    return false;
 }
 
 bool FSEventReader::handleURL(const Run& run, FSEventReaderDelegate& delegate,
@@ -238,7 +259,7 @@ bool FSEventReader::handleItem(const Run& run, FSEventReaderDelegate& delegate,
 // another one, which its number tells as well.
 bool FSEventReader::tellOutOfSight(const Run& run, FSEventReaderDelegate& delegate,
                                    const FileEvent& event, const URL& url) const {
-    if (!isMoveToHere(event)) {
+    if (!isMoveToHere(event) && !says(event, FileEventFlag::documentMoved)) {
         return true;
     }
     const auto status = platform_.fileSystem.status(url);
