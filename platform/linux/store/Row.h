@@ -64,12 +64,16 @@ struct alignas(64) Row {
 
     // A folder has no size of its own; its place holds the first child and the number of
     // subfolders.
-    [[nodiscard]] RowNumber firstChild() const { return static_cast<RowNumber>(size); }
+    [[nodiscard]] RowNumber firstChild() const {
+        return isFolder() ? static_cast<RowNumber>(size) : noRow;
+    }
     void setFirstChild(RowNumber row) { size = (size & ~std::uint64_t{0xFFFFFFFF}) | row; }
     [[nodiscard]] std::uint32_t subfolders() const {
         return static_cast<std::uint32_t>(size >> 32U);
     }
-    void setSubfolders(std::uint32_t count) { size = (std::uint64_t{count} << 32U) | firstChild(); }
+    void setSubfolders(std::uint32_t count) {
+        size = (std::uint64_t{count} << 32U) | static_cast<RowNumber>(size);
+    }
 };
 static_assert(sizeof(Row) == 64 && std::is_trivially_copyable_v<Row>);
 

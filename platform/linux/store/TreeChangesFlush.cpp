@@ -59,11 +59,14 @@ void TreeChanges::flushRow(RowNumber number, std::uint32_t bits) {
         moved_.erase(moved);
         return;
     }
+    const bool isNew = (bits & Row::touchedAppeared) != 0;
+    if (!isNew && index_.row(number).has(Row::severalLinks)) {
+        noteOtherNames(number);  // the one that it was written under may be out of sight
+    }
     if (now.package != noRow) {
         packagesChanged_.push_back(now.package);
         return;
     }
-    const bool isNew = (bits & Row::touchedAppeared) != 0;
     const bool isBack = (bits & Row::touchedRenamed) != 0;
     told_.push_back(number);
     rest_.add({.flags = (isNew    ? FileEventFlag::appeared

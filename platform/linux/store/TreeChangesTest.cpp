@@ -32,6 +32,12 @@ class TreeChangesTest : public testing::Test {
     RowNumber addFile(RowNumber folder, const std::string& name, std::uint64_t fileID) {
         return add(folder, name, valuesOf(RowKind::file, fileID));
     }
+    RowNumber addFileOfSize(RowNumber folder, const std::string& name, std::uint64_t fileID,
+                            std::uint64_t size) {
+        Row values = valuesOf(RowKind::file, fileID);
+        values.size = size;
+        return add(folder, name, values);
+    }
     RowNumber addLink(RowNumber folder, const std::string& name, std::uint64_t fileID) {
         Row values = valuesOf(RowKind::file, fileID);
         values.set(Row::severalLinks, true);
@@ -100,6 +106,26 @@ TEST_F(TreeChangesTest, OtherNamesCountWhateverTheLinksWereAtTheLastLook) {
     (void)addFile(rootRow, "b", 10);
     drop(a);
     EXPECT_THAT(commit(), ElementsAre("gone a, file 10", "changed b, file 10"));
+}
+
+TEST_F(TreeChangesTest, WhenAFileChangesUnderOneNameTheOthersAreToldOf) {
+    const RowNumber package = addFolder(rootRow, "a.bundle", 9);
+    const RowNumber inside = addLink(package, "a", 10);
+    (void)addLink(rootRow, "b", 10);
+    changes().changed(inside);
+    EXPECT_THAT(commit(), ElementsAre("changed a.bundle, file 9", "changed b, file 10"));
+    const RowNumber hidden = addLink(rootRow, ".hidden", 10);
+    changes().changed(hidden);
+    EXPECT_THAT(commit(), ElementsAre("changed .hidden, file 10", "changed b, file 10"));
+}
+
+// A file's size stands where a folder has its first child.
+TEST_F(TreeChangesTest, AFileThatIsNotEmptyMoves) {
+    const RowNumber file = addFileOfSize(rootRow, "file", 10, 1U << 20U);
+    move(file, rootRow, "moved");
+    EXPECT_THAT(commit(), ElementsAre("gone+renamed file, file 10", "renamed moved, file 10"));
+    changes().returned(file);
+    EXPECT_THAT(commit(), ElementsAre("renamed moved, file 10"));
 }
 
 TEST_F(TreeChangesTest, AnotherNameThatIsToldOfAnywayIsToldOfOnce) {
