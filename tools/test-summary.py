@@ -12,6 +12,7 @@ from collections import defaultdict
 
 PASSED = re.compile(r"^\[       OK \] (\S+?)(?:, where .*)? \(", re.MULTILINE)
 FAILED = re.compile(r"^\[  FAILED  \] (\S+?)(?:, where .*)? \(", re.MULTILINE)
+STARTED = re.compile(r"^\[ RUN      \] (\S+)", re.MULTILINE)
 # GoogleTest writes the place, the reason (which may have several lines) and then the name.
 SKIPPED = re.compile(
     r"^[^\n]*: Skipped\n(?P<reason>(?:(?!\[)[^\n]*\n)*?)\n*\[  SKIPPED \] (?P<name>[^\s,]+)",
@@ -34,6 +35,8 @@ def summarize(name, text):
     failed = set(FAILED.findall(text))
     skipped = skipped_tests(text)
     count = sum(len(names) for names in skipped.values())
+    # A process that crashed, or was ended for taking too long, says nothing of its test.
+    failed |= set(STARTED.findall(text)) - passed - set().union(*skipped.values())
     lines = [f"{name}: {len(passed)} passed, {len(failed)} failed, {count} skipped"]
     lines += [f"  FAILED {test}" for test in sorted(failed)]
     for reason, names in sorted(skipped.items()):
