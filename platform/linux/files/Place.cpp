@@ -66,6 +66,7 @@ Expected<Place> Place::inside(const URL& url, const ServedTrees::Location& locat
     Place place(url, trees,
                 path.empty() ? "." : path.substr(slash == std::string::npos ? 0 : slash + 1));
     place.device_ = location.device;
+    place.root_ = location.keptOpen;
     place.directory_ = location.root;
     if (slash != std::string::npos) {
         auto folder = trees.holdFolder(location, path.substr(0, slash));

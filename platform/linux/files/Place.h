@@ -1,6 +1,7 @@
 #pragma once
 
 #include <fcntl.h>
+#include <memory>
 #include <optional>
 #include <string>
 
@@ -54,8 +55,9 @@ class Place {
 
     URL url_;
     const ServedTrees& trees_;
-    std::optional<DeviceID> device_;  // of the served tree
-    UniqueFD folder_;                 // unless the folder is a root, or none
+    std::optional<DeviceID> device_;    // of the served tree
+    std::shared_ptr<const void> root_;  // keeps it open
+    UniqueFD folder_;                   // unless the folder is a root, or none
     int directory_ = AT_FDCWD;
     std::string name_;
 };

@@ -46,11 +46,29 @@ ServedTrees::ServedTrees(const std::vector<std::string>& rootFolders,
         }
     }
     for (const std::string& path : rootFolders) {
-        Folder& root = roots_.emplace_back(open(path));
-        root.path = withoutTrailingSlashes(root.path);
-        root.holdsPrivateFolders = std::ranges::any_of(
-            private_, [&](const Folder& folder) { return liesBelow(folder, root); });
+        roots_.push_back(openRoot(path));
     }
+}
+
+std::shared_ptr<const ServedTrees::Folder> ServedTrees::openRoot(const std::string& path) const {
+    auto root = std::make_shared<Folder>(open(path));
+    root->path = withoutTrailingSlashes(path);
+    root->holdsPrivateFolders = std::ranges::any_of(
+        private_, [&](const Folder& folder) { return liesBelow(folder, *root); });
+    return root;
+}
+
+void ServedTrees::setRoots(const std::vector<std::string>& rootFolders) {
+    std::vector<std::shared_ptr<const Folder>> roots;
+    for (const std::string& path : rootFolders) {
+        auto known = rootOf(path);
+        const auto stands = statEntry(AT_FDCWD, path.c_str());
+        const bool isSame = known != nullptr && known->path == withoutTrailingSlashes(path) &&
+                            stands && known->isAt(*stands);
+        roots.push_back(isSame ? std::move(known) : openRoot(path));
+    }
+    const std::lock_guard lock(mutex_);
+    roots_ = std::move(roots);
 }
 
 bool ServedTrees::Folder::isAt(const EntryStatus& status) const {
@@ -93,19 +111,20 @@ bool ServedTrees::liesBelow(const Folder& inner, const Folder& outer) {
     return true;
 }
 
-const ServedTrees::Folder* ServedTrees::rootOf(std::string_view path) const {
-    const Folder* innermost = nullptr;
-    for (const Folder& root : roots_) {
-        if (contains(root.path, path) &&
-            (innermost == nullptr || root.path.size() > innermost->path.size())) {
-            innermost = &root;
+std::shared_ptr<const ServedTrees::Folder> ServedTrees::rootOf(std::string_view path) const {
+    const std::lock_guard lock(mutex_);
+    std::shared_ptr<const Folder> innermost;
+    for (const auto& root : roots_) {
+        if (contains(root->path, path) &&
+            (innermost == nullptr || root->path.size() > innermost->path.size())) {
+            innermost = root;
         }
     }
     return innermost;
 }
 
 Expected<std::optional<ServedTrees::Location>> ServedTrees::locate(std::string_view path) const {
-    const Folder* root = rootOf(path);
+    auto root = rootOf(path);
     if (root == nullptr) {
         return std::optional<Location>();
     }
@@ -116,10 +135,14 @@ Expected<std::optional<ServedTrees::Location>> ServedTrees::locate(std::string_v
     if (!root->isAt(*stands)) {
         return Unexpected(notServed(root->path));
     }
-    Location location{root->held.get(), root->device, root->holdsPrivateFolders, {}};
+    Location location;
+    location.root = root->held.get();
+    location.device = root->device;
+    location.mayMeetPrivateFolders = root->holdsPrivateFolders;
     if (path.size() > root->path.size()) {
         location.relativePath = path.substr(root->path.size() + 1);
     }
+    location.keptOpen = std::move(root);
     return std::optional(std::move(location));
 }
 

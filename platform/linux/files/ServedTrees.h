@@ -1,5 +1,7 @@
 #pragma once
 
+#include <memory>
+#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -17,8 +19,11 @@ namespace marrowdale::native {
 // a folder on the way that was exchanged for a link, or that another tree is mounted on, leads
 // nowhere. Applications own these trees, and may change them while they are looked at.
 //
-// Immutable but for what it holds open; any thread.
+// Which folders are roots may change while they are used: what was located before stays good. Any
+// thread.
 class ServedTrees {
+    struct Folder;
+
   public:
     // `rootFolders` and `privateFolders` are absolute paths. Private folders (the state's and the
     // cache's) are left out, with all that is in them, where they lie below a root; they are known
@@ -27,9 +32,14 @@ class ServedTrees {
     ServedTrees(const std::vector<std::string>& rootFolders,
                 const std::vector<std::string>& privateFolders);
 
-    // A place below a root, or the root itself; good as long as the trees.
+    // From now on these are the roots. One that was a root before and stands where it stood is the
+    // same; any other is looked up anew.
+    void setRoots(const std::vector<std::string>& rootFolders);
+
+    // A place below a root, or the root itself.
     struct Location {
-        int root = -1;  // open for looking names up in it; the trees' own
+        std::shared_ptr<const Folder> keptOpen;
+        int root = -1;  // open for looking names up in it, as long as `keptOpen` is there
         DeviceID device{};
         bool mayMeetPrivateFolders = false;
         std::string relativePath;  // without "." and ".."; empty for the root
@@ -60,10 +70,12 @@ class ServedTrees {
 
     [[nodiscard]] static Folder open(const std::string& path);
     [[nodiscard]] static bool liesBelow(const Folder& inner, const Folder& outer);
-    [[nodiscard]] const Folder* rootOf(std::string_view path) const;
+    [[nodiscard]] std::shared_ptr<const Folder> openRoot(const std::string& path) const;
+    [[nodiscard]] std::shared_ptr<const Folder> rootOf(std::string_view path) const;
     [[nodiscard]] Expected<UniqueFD> holdInSteps(int root, const std::string& relativePath) const;
 
-    std::vector<Folder> roots_;
+    mutable std::mutex mutex_;
+    std::vector<std::shared_ptr<const Folder>> roots_;  // guarded by mutex_
     std::vector<Folder> private_;
 };
 

@@ -123,5 +123,33 @@ TEST_F(ServedTreesTest, privateFoldersElsewhereCostNothing) {
     EXPECT_FALSE((*trees.locate(at("root")))->mayMeetPrivateFolders);
 }
 
+TEST_F(ServedTreesTest, rootsMayChangeAndWhatWasLocatedStaysGood) {
+    makeFolders({"root", "library/in", "state"});
+    ServedTrees trees({at("root")}, {at("state")});
+    EXPECT_EQ(rootNumber(trees, at("library/in")), 0U);
+    const auto inRoot = trees.locate(at("root/a"));
+    trees.setRoots({at("root"), at("library")});
+    EXPECT_EQ(rootNumber(trees, at("library/in")), number(at("library")));
+    EXPECT_EQ((*trees.locate(at("root")))->root, (*inRoot)->root) << "it stays open";
+    const auto inLibrary = trees.locate(at("library/in"));
+    const auto inode = number(at("library"));
+    trees.setRoots({at("root")});
+    EXPECT_EQ(rootNumber(trees, at("library/in")), 0U);
+    EXPECT_EQ(raw(statEntry((*inLibrary)->root, "")->fileID), inode) << "as long as it is used";
+    EXPECT_TRUE(trees.holdFolder(**inLibrary, "in"));
+}
+
+TEST_F(ServedTreesTest, aRootThatWasMadeAnewIsFoundWhenRootsAreSet) {
+    makeFolders({"root", "library"});
+    ServedTrees trees({at("root"), at("library"), at("later")}, {});
+    std::filesystem::rename(at("library"), at("away"));
+    makeFolders({"library", "later"});
+    EXPECT_EQ(codeOf(trees, at("library")), ENOENT);
+    EXPECT_EQ(codeOf(trees, at("later")), ENOENT);
+    trees.setRoots({at("root"), at("library"), at("later")});
+    EXPECT_EQ(rootNumber(trees, at("library")), number(at("library")));
+    EXPECT_EQ(rootNumber(trees, at("later")), number(at("later")));
+}
+
 }  // namespace
 }  // namespace marrowdale::native
