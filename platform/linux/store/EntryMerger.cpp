@@ -171,7 +171,7 @@ bool EntryMerger::isEarlierFile(const Row& row, const EntryLook& look) {
 void EntryMerger::leaveEarlier(const EntryLook& look) {
     for (const RowNumber number : index_.rowsOfFile(raw(look.status.fileID))) {
         const Row& row = index_.row(number);
-        if (number != rootRow && !row.has(Row::limbo) && isEarlierFile(row, look)) {
+        if (!index_.isRoot(number) && !row.has(Row::limbo) && isEarlierFile(row, look)) {
             changes_.leave(number);
         }
     }
@@ -210,13 +210,16 @@ RowNumber EntryMerger::merge(RowNumber folder, std::string_view name, const Entr
     if (kin.row != noRow && look.status.isDirectory() && index_.isWithin(folder, kin.row)) {
         return noRow;
     }
+    if (kin.row != noRow && index_.isLibrary(kin.row) && !index_.row(kin.row).has(Row::limbo)) {
+        changes_.leave(kin.row);  // it is an ordinary folder now
+    }
     if (current != noRow) {
         changes_.leave(current);
     }
     leaveEarlier(look);
     const bool isInLimbo = kin.row != noRow && index_.row(kin.row).has(Row::limbo);
     const bool hasOneName = look.status.isDirectory() || look.status.linkCount <= 1;
-    if (kin.row == noRow || kin.row == rootRow || (!isInLimbo && !hasOneName)) {
+    if (kin.row == noRow || index_.isRoot(kin.row) || (!isInLimbo && !hasOneName)) {
         return addName(folder, name, look, kin);
     }
     if (!isInLimbo) {

@@ -16,7 +16,8 @@ struct StoredEvent {
     std::uint32_t flags = 0;    // FileEventFlag, of those that tell of an item
     FileID fileID{};            // 0: none
     DocumentID goneDocument{};  // gone from the volume with this event; 0: none
-    // Below the root, without a "/" in front; empty: the root itself. With
+    // Below the root, without a "/" in front; empty: the root itself. In a library "/KEY" and what
+    // follows. With
     // FileEventFlag::documentMoved it is that feed's whole path instead.
     std::string_view path;
 };

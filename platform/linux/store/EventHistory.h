@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "platform/foundation/Error.h"
 #include "platform/foundation/Identifiers.h"
@@ -13,6 +14,14 @@
 #include "platform/linux/store/EventBatch.h"
 
 namespace marrowdale::native {
+
+// One of the trees that a history tells of.
+struct EventRoot {
+    // What the paths of its events begin with: empty for the root, "/KEY" for a library.
+    std::string prefix;
+    std::string path;        // where it stands; absolute
+    bool isRecorded = true;  // false: what happens there is missed now
+};
 
 // Goes through the history in order. Reads what is committed from the segments on disk, checks
 // every byte it hands out, and holds the segment it reads open, so that retention does not take it
@@ -49,8 +58,8 @@ class EventHistory {
     // A cursor that begins behind `since`, which is good.
     [[nodiscard]] virtual Expected<std::unique_ptr<EventCursor>> eventsSince(EventID since) = 0;
 
-    // Where the root stands, and the volume it lies on.
-    [[nodiscard]] virtual std::string rootPath() = 0;
+    // The trees that it tells of, as they are now, the root first; and the volume they lie on.
+    [[nodiscard]] virtual std::vector<EventRoot> roots() = 0;
     [[nodiscard]] virtual DeviceID device() = 0;
     [[nodiscard]] virtual Expected<UUID> volumeUUID(const URL& url) = 0;
 

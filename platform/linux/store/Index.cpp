@@ -217,7 +217,7 @@ void Index::link(RowNumber number) {
         row(last).next = number;
         row(first).previous = number;
     }
-    if (entry.isFolder()) {
+    if (entry.isFolder() && !isLibrary(number)) {
         folder.setSubfolders(folder.subfolders() + 1);
     }
 }
@@ -238,7 +238,7 @@ void Index::unlink(RowNumber number) {
     }
     entry.next = noRow;
     entry.previous = noRow;
-    if (entry.isFolder()) {
+    if (entry.isFolder() && !isLibrary(number)) {
         folder.setSubfolders(folder.subfolders() - 1);
     }
 }

@@ -34,6 +34,13 @@ class Index {
         return names_.at(row(number).name);
     }
 
+    // Whether the row is a library's: a child of the root, under a name that no file can have, "/"
+    // and the library's key. It is no subfolder of the root.
+    [[nodiscard]] bool isLibrary(RowNumber number) const { return name(number).starts_with('/'); }
+    [[nodiscard]] bool isRoot(RowNumber number) const {
+        return number == rootRow || isLibrary(number);
+    }
+
     // Rows that are in use.
     [[nodiscard]] std::size_t count() const { return count_; }
     [[nodiscard]] std::size_t documentCount() const { return byDocument_.count(); }
@@ -45,8 +52,8 @@ class Index {
     // The rows, placed or in limbo, that have that inode number or document; mostly one.
     [[nodiscard]] std::vector<RowNumber> rowsOfFile(std::uint64_t fileID) const;
     [[nodiscard]] std::vector<RowNumber> rowsOfDocument(std::uint32_t document) const;
-    // The path below the root, without a "/" in front; empty for the root. False when the row or a
-    // folder above it is in limbo.
+    // The path below the root, without a "/" in front; empty for the root; in a library, "/KEY" and
+    // what follows (RecordedRoots). False when the row or a folder above it is in limbo.
     [[nodiscard]] bool path(RowNumber number, std::string& path) const;
     // Whether `number` is `folder` or lies below it.
     [[nodiscard]] bool isWithin(RowNumber number, RowNumber folder) const;
@@ -125,6 +132,7 @@ class Index {
     void removeDocument(RowNumber number);
     void freeRow(RowNumber number);
     void markRenewed(RowNumber number);
+    [[nodiscard]] bool hasGoodName(RowNumber number) const;
     [[nodiscard]] bool isGoodRow(RowNumber number) const;
     [[nodiscard]] bool linkRestored();
     [[nodiscard]] bool indexRestored();

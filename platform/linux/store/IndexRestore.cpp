@@ -1,6 +1,7 @@
 // Making the index from the rows that a snapshot and the log hold.
 
 #include <string>
+#include <string_view>
 
 #include "platform/linux/store/Index.h"
 
@@ -57,15 +58,27 @@ void Index::freeRestoredRow(RowNumber number) {
     row(number) = Row{};
 }
 
+// A name with a "/" in it is a library's.
+bool Index::hasGoodName(RowNumber number) const {
+    const Row& entry = row(number);
+    if (!names_.isGood(entry.name)) {
+        return false;
+    }
+    const std::string_view text = name(number);
+    const std::size_t slash = text.rfind('/');
+    return slash == std::string_view::npos || (slash == 0 && text.size() > 1 && entry.isFolder() &&
+                                               (entry.parent == rootRow || entry.has(Row::limbo)));
+}
+
 bool Index::isGoodRow(RowNumber number) const {
     const Row& entry = row(number);
     if (number == rootRow) {
         return entry.isFolder() && entry.parent == noRow && entry.name == NameArena::noName;
     }
     if (entry.has(Row::limbo)) {
-        return names_.isGood(entry.name) && entry.parent == noRow;
+        return hasGoodName(number) && entry.parent == noRow;
     }
-    return names_.isGood(entry.name) && entry.parent != noRow && entry.parent < endOfRows_ &&
+    return hasGoodName(number) && entry.parent != noRow && entry.parent < endOfRows_ &&
            row(entry.parent).isFolder();
 }
 

@@ -90,7 +90,11 @@ std::optional<UniqueFD> LiveUpdate::openFolderOf(FileID folder) {
             return UniqueFD();
         }
     }
-    auto opened = holdFolderBeneath(scope_.root, path);
+    const auto place = scope_.roots.place(path);
+    if (!place) {
+        return std::nullopt;
+    }
+    auto opened = holdFolderBeneath(place->folder(), place->path);
     if (!opened) {
         return UniqueFD();
     }

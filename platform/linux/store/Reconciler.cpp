@@ -44,15 +44,12 @@ Reconciler::Reconciler(const TreeScope& scope)
       merger_(scope.index, scope.changes, scope.saves),
       watches_(scope.watches),
       carrier_(scope.carrier),
-      root_(scope.root),
-      rootPath_(scope.rootPath),
+      roots_(scope.roots),
       device_(scope.device),
       skipped_(scope.skipped) {}
 
 Expected<ReconcileReport> Reconciler::run() {
-    if (auto done = startAtRoot(); !done) {
-        return Unexpected(done.error());
-    }
+    startAtRoots();
     return walkUntilSettled(Threads::two);
 }
 
@@ -81,24 +78,17 @@ Expected<ReconcileReport> Reconciler::walkUntilSettled(Threads threads) {
     return report_;
 }
 
-Expected<void> Reconciler::startAtRoot() {
-    const Date now = Date::now();
-    const auto status = statEntry(root_, "");
-    if (!status) {
-        return Unexpected(errorWithPOSIXCode(status.error().code, "look at", rootPath_));
-    }
-    const auto fingerprint = handleFingerprint(root_, "");
-    const EntryLook look{*status, fingerprint ? *fingerprint : 0, now};
+// A library that can't be recorded now keeps what is known of it.
+void Reconciler::startAtRoots() {
+    const auto libraries = roots_.libraries();
     const MutexLock lock(mutex_);
-    if (index_.endOfRows() <= rootRow) {
-        (void)index_.add(noRow, {}, EntryMerger::valuesOf(look));
-    } else if (!EntryMerger::isUnchanged(index_.row(rootRow), *status)) {
-        Row values = EntryMerger::valuesOf(look);
-        values.set(Row::unreadable, index_.row(rootRow).has(Row::unreadable));
-        index_.update(rootRow, values);
-    }
     stack_.push_back(rootRow);
-    return {};
+    for (const auto& library : libraries) {
+        const RowNumber row = index_.child(rootRow, library->storedPath());
+        if (row != noRow && library->isOpen()) {
+            stack_.push_back(row);
+        }
+    }
 }
 
 void Reconciler::walk(Threads threads) {
@@ -169,8 +159,11 @@ void Reconciler::visit(Visit& visit) {
 }
 
 void Reconciler::noteUnreadable(const Visit& visit) {
-    const auto status = statEntry(root_, visit.path.c_str());
-    if (status) {
+    const auto place = roots_.place(visit.path);
+    if (!place) {
+        return;
+    }
+    if (const auto status = statEntry(place->folder(), place->path.c_str())) {
         const MutexLock lock(mutex_);
         merger_.noteFolderDigest(visit.folder, folderDigest(-1, *status));
         watches_.noteUnwatched(status->fileID, "can't read " + visit.path);
@@ -198,7 +191,9 @@ Reconciler::Outcome Reconciler::outcomeOf(const Error& error) {
 }
 
 Reconciler::Outcome Reconciler::list(Visit& visit, Batch& batch) {
-    auto folder = openFolderBeneath(root_, visit.path);
+    const auto place = roots_.place(visit.path);
+    auto folder = place ? openFolderBeneath(place->folder(), place->path)
+                        : Unexpected(errorWithPOSIXCode(ENOENT, "list", visit.path));
     if (!folder) {
         return outcomeOf(folder.error());
     }
@@ -213,7 +208,7 @@ Reconciler::Outcome Reconciler::list(Visit& visit, Batch& batch) {
             return Outcome::vanished;
         }
     }
-    watches_.watchFolder(folder->get(), status->fileID, visit.folder == rootRow);
+    watches_.watchFolder(folder->get(), status->fileID, place->path.empty());
     const std::uint32_t digest = folderDigest(folder->get(), *status);
     {
         const MutexLock lock(mutex_);
@@ -366,7 +361,7 @@ void Reconciler::finishFolder(const Visit& visit, Outcome outcome) {
         next = row.next;
         if (row.has(Row::seen)) {
             row.set(Row::seen, false);
-        } else if (outcome == Outcome::listed) {
+        } else if (outcome == Outcome::listed && !index_.isLibrary(child)) {
             changes_.leave(child);
         }
     }
@@ -391,7 +386,9 @@ bool Reconciler::hasChanged(const Stamp& stamp) {
             return false;
         }
     }
-    const auto status = statEntry(root_, path.c_str());
+    const auto place = roots_.place(path);
+    const auto status = place ? statEntry(place->folder(), place->path.c_str())
+                              : Unexpected(errorWithPOSIXCode(ENOENT, "look at", path));
     return !status || stamp.unsure || status->modified != stamp.modified;
 }
 

@@ -13,6 +13,7 @@
 #include "platform/linux/store/FolderWatches.h"
 #include "platform/linux/store/Index.h"
 #include "platform/linux/store/Mutex.h"
+#include "platform/linux/store/RecordedRoots.h"
 #include "platform/linux/store/StoreReport.h"
 
 namespace marrowdale::native {
@@ -26,16 +27,15 @@ struct TreeScope {
     SafeSaves& saves;
     FolderWatches& watches;
     AttributeCarrier& carrier;
-    int root;  // the open root folder
-    const std::string& rootPath;
+    const RecordedRoots& roots;
     DeviceID device;
     std::vector<FileID> skipped;  // folders on its device that are left out
 };
 
-// A walk over the tree, or over some folders of it, that brings the index to what is on disk. Made
-// for one run. Each folder is watched before it is listed, where there is a watcher.
+// A walk over the recorded trees, or over some folders of them, that brings the index to what is on
+// disk. Made for one run. Each folder is watched before it is listed, where there is a watcher.
 //
-// Each folder is listed below the root by folder handle, links never followed; entries that show
+// Each folder is listed below its root by folder handle, links never followed; entries that show
 // no change cost one statx. What is not met any more goes to limbo, and comes back with its row
 // (document, and all below it) where it is met elsewhere; what is still in limbo at the end is
 // gone. Before that, folders that changed after they were listed are listed again, for things
@@ -44,7 +44,7 @@ class Reconciler {
   public:
     explicit Reconciler(const TreeScope& scope);
 
-    // Walks the whole tree, with two threads. Errors: the root can't be read; no memory or
+    // Walks all trees, with two threads; their topmost folders have rows. Errors: no memory or
     // descriptors are left. After an error the index is good, but not up to date.
     [[nodiscard]] Expected<ReconcileReport> run();
     // Walks these folders and what is below them, on this thread. They are placed.
@@ -76,7 +76,7 @@ class Reconciler {
     // One folder being listed.
     struct Visit {
         RowNumber folder = noRow;
-        std::string path;  // below the root
+        std::string path;  // as stored
         RowNumber cursor = noRow;
     };
     // When a folder was listed, to see whether it changed since.
@@ -89,7 +89,7 @@ class Reconciler {
 
     enum class Threads : std::uint8_t { one, two };
 
-    [[nodiscard]] Expected<void> startAtRoot() MARROWDALE_EXCLUDES(mutex_);
+    void startAtRoots() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<ReconcileReport> walkUntilSettled(Threads threads)
         MARROWDALE_EXCLUDES(mutex_);
     void walk(Threads threads);
@@ -120,8 +120,7 @@ class Reconciler {
     EntryMerger merger_ MARROWDALE_GUARDED_BY(mutex_);
     FolderWatches& watches_;
     AttributeCarrier& carrier_;
-    const int root_;
-    const std::string& rootPath_;
+    const RecordedRoots& roots_;
     const DeviceID device_;
     const std::vector<FileID> skipped_;
     bool settled_ = false;

@@ -23,8 +23,10 @@ struct alignas(64) Row {
     static constexpr std::uint32_t severalLinks = 1U << 3U;
     static constexpr std::uint32_t unreadable = 1U << 4U;
     static constexpr std::uint32_t limbo = 1U << 5U;  // has no place now; perhaps it was moved
+    // A library that was not recorded for a while: nobody was told what is in it.
+    static constexpr std::uint32_t untold = 1U << 6U;
     // Those that are kept on disk; the rest lives for one reconcile or one commit.
-    static constexpr std::uint32_t lastingFlags = 0x00FFFF3FU;
+    static constexpr std::uint32_t lastingFlags = 0x00FFFF7FU;
     static constexpr std::uint32_t seen = 1U << 24U;      // met by the reconcile that is running
     static constexpr std::uint32_t visiting = 1U << 26U;  // being listed
     static constexpr std::uint32_t dirty = 1U << 27U;     // differs from the log

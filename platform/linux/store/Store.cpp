@@ -21,6 +21,10 @@ Expected<void> Store::reconcile() {
     return core_->reconcile();
 }
 
+Expected<void> Store::setLibraries(std::vector<LibraryFolder> libraries) {
+    return core_->setLibraries(std::move(libraries));
+}
+
 StoreReport Store::report() const {
     return core_->report();
 }
@@ -58,8 +62,8 @@ Expected<std::unique_ptr<EventCursor>> Store::eventsSince(EventID since) {
     return core_->eventsSince(since);
 }
 
-std::string Store::rootPath() {
-    return core_->rootPath();
+std::vector<EventRoot> Store::roots() {
+    return core_->eventRoots();
 }
 
 DeviceID Store::device() {

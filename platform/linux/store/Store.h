@@ -13,9 +13,9 @@
 
 namespace marrowdale::native {
 
-// The durable store of one root folder: which entries there are, their document identifiers, and
-// the counter of events. One process at a time has it; within the process any thread may call,
-// several at once. Requests wait while a reconcile runs.
+// The durable store of one root folder and of the libraries recorded beside it: which entries there
+// are, their document identifiers, and the counter of events. One process at a time has it; within
+// the process any thread may call, several at once. Requests wait while a reconcile runs.
 //
 // Nothing is handed out before it is synced to disk. When the disk refuses (ENOSPC, EIO, …), new
 // identifiers are refused with that error and everything known is still answered; after a failed
@@ -47,14 +47,28 @@ class Store final : public GenerationStore, public EventHistory, public Document
     // root can't be read; the differences can't be committed.
     [[nodiscard]] Expected<void> reconcile();
 
+    // The folders that are recorded beside the root from now on, all of them. When it returns,
+    // those that are new are indexed, and every path in them has an event of its own, whether or
+    // not it was known from an earlier time: who is told of a library now has been told of nothing
+    // in it. What was given an identifier then has it still. One that is no more in the list is no
+    // more looked at; what was in it is gone where its folder is.
+    //
+    // A folder that can't be recorded is left out, and looked for at each pass: it is missing
+    // (ENOENT; what was in it is gone), no folder or a link (ENOTDIR), on another volume than the
+    // root (EXDEV), unreadable (EACCES), has no good key, holds another root or lies in one, or is
+    // the state or cache folder (EINVAL); of two that get in each other's way the one with the
+    // lower key counts. That is no error here: StoreReport::libraries tells. Errors: the trees
+    // can't be looked at.
+    [[nodiscard]] Expected<void> setLibraries(std::vector<LibraryFolder> libraries);
+
     [[nodiscard]] StoreReport report() const;
 
     // GenerationStore. Documents of names that are gone are looked for once (a reconcile) before
     // the answer is ENOENT; another volume is ENXIO.
     [[nodiscard]] Expected<FileID> resolveDocumentID(DocumentID document, DeviceID device) override;
-    // The file must be below the root: ENOENT otherwise, ENXIO on another volume.
+    // The file must be below a root: ENOENT otherwise, ENXIO on another volume.
     [[nodiscard]] Expected<DocumentID> getOrAllocateDocumentID(const OpenFile& file) override;
-    // Below the root as well. What the disk says of the entry is merged into the index, and
+    // Below a root as well. What the disk says of the entry is merged into the index, and
     // committed with what comes next.
     [[nodiscard]] Expected<DocumentID> permanentStorageForItemAtURL(
         const URL& url, AllocateIfNone allocateIfNone) override;
@@ -66,14 +80,14 @@ class Store final : public GenerationStore, public EventHistory, public Document
     [[nodiscard]] EventID lastEventID() override;
     [[nodiscard]] Standing standingOf(EventID since) override;
     [[nodiscard]] Expected<std::unique_ptr<EventCursor>> eventsSince(EventID since) override;
-    [[nodiscard]] std::string rootPath() override;
+    [[nodiscard]] std::vector<EventRoot> roots() override;
     [[nodiscard]] DeviceID device() override;
     [[nodiscard]] Expected<UUID> volumeUUID(const URL& url) override;
     [[nodiscard]] std::uint64_t addListener(std::function<void(News)> listener) override;
     void removeListener(std::uint64_t number) override;
 
-    // DocumentIndex. What lies outside the root, or in the state or cache folder, is ENOENT; what
-    // lies behind a mount is ENXIO.
+    // DocumentIndex. What lies in none of the trees, or in the state or cache folder, is ENOENT;
+    // what lies behind a mount is ENXIO.
     [[nodiscard]] Expected<void> assignDocumentIDs(std::span<Request> requests) override;
     [[nodiscard]] DocumentID knownDocumentID(const EntryStatus& status) override;
     [[nodiscard]] Expected<std::string> pathForFileID(DeviceID device, FileID file) override;

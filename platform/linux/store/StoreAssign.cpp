@@ -43,22 +43,12 @@ Expected<void> Store::Core::assignDocumentIDs(std::span<Request> requests) {
     return giveOut(requests, *looked);
 }
 
-// The way to a folder below the root; none to what does not lie there.
-std::optional<std::string> Store::Core::pathBelowRoot(std::string_view path) const {
-    const std::string_view root = rootPath_ == "/" ? std::string_view() : rootPath_;
-    if (!path.starts_with(root)) {
-        return std::nullopt;
+RowNumber Store::Core::rootRowOf(const Request& request) {
+    const auto folder = roots_.folderAt(request.status);
+    if (folder == nullptr) {
+        return noRow;
     }
-    path.remove_prefix(root.size());
-    if (!path.empty() && path.front() != '/') {
-        return std::nullopt;
-    }
-    path.remove_prefix(std::min(path.find_first_not_of('/'), path.size()));
-    return std::string(path);
-}
-
-bool Store::Core::isRoot(const Request& request) const {
-    return request.status.fileID == rootID_ && request.status.device == device_;
+    return folder->key.empty() ? rootRow : index_.child(rootRow, folder->storedPath());
 }
 
 // What is never indexed would get a number that never means anything.
@@ -70,10 +60,10 @@ Expected<void> Store::Core::refuseForeign(std::span<const Request> requests,
     const auto unindexed = unindexedFolders();
     for (const std::size_t i : unknown) {
         const Request& request = requests[i];
-        if (isRoot(request)) {
+        if (roots_.folderAt(request.status) != nullptr) {
             continue;
         }
-        if (!pathBelowRoot(request.folderPath) || isUnindexed(request, unindexed)) {
+        if (!roots_.storedPath(request.folderPath) || isUnindexed(request, unindexed)) {
             return Unexpected(errorWithPOSIXCode(ENOENT, "identify", request.name));
         }
         if (request.status.isMountPoint) {
@@ -117,11 +107,10 @@ Expected<bool> Store::Core::fillKnown(std::span<Request> requests,
             guess = noRow;
         }
         request.document = {};
-        // The folder that the root lies in has no row.
-        const bool asksForRoot = isRoot(request);
-        foldersKnown = foldersKnown && (asksForRoot || parent != noRow);
-        RowNumber row = asksForRoot ? rootRow : noRow;
-        if (!asksForRoot && parent != noRow) {
+        // The folder that a root lies in has no row.
+        RowNumber row = rootRowOf(request);
+        foldersKnown = foldersKnown && (row != noRow || parent != noRow);
+        if (row == noRow && parent != noRow) {
             row = merger.unchangedRow(parent, request.name, request.status, guess);
         }
         if (row == noRow) {
@@ -137,8 +126,9 @@ Expected<bool> Store::Core::fillKnown(std::span<Request> requests,
 // The folder of a request, where it still is the one that the entry was found in; else none.
 // Errors: a mount was put on the way.
 Expected<UniqueFD> Store::Core::folderOf(const Request& request) const {
-    const auto path = pathBelowRoot(request.folderPath);
-    auto folder = path ? openFolderBeneath(root_.get(), *path) : UniqueFD();
+    const auto path = roots_.storedPath(request.folderPath);
+    const auto place = path ? roots_.place(*path) : std::nullopt;
+    auto folder = place ? openFolderBeneath(place->folder(), place->path) : UniqueFD();
     if (!folder) {
         return folder.error().code == EXDEV
                    ? Unexpected(errorWithPOSIXCode(ENXIO, "identify", request.name))

@@ -20,6 +20,15 @@ void Store::Core::writeSnapshotIfLong() {
     }
 }
 
+// What lies below the root is named from there.
+void Store::Core::withAbsolutePaths(std::vector<std::string>& storedPaths) const {
+    for (std::string& path : storedPaths) {
+        if (path.starts_with('/')) {
+            path = roots_.absolutePath(path).value_or(path);
+        }
+    }
+}
+
 StoreReport Store::Core::report() {
     StoreReport report;
     report.stores = state_.stores();
@@ -27,7 +36,7 @@ StoreReport Store::Core::report() {
     waitUntilIdle();
     report.stateFolder = state_.path();
     report.storeFolder = folder_.store();
-    report.rootPath = rootPath_;
+    report.rootPath = rootPath();
     report.uuid = identity_.uuid;
     constexpr std::int64_t billion = 1'000'000'000;
     report.created = {identity_.created / billion,
@@ -53,6 +62,11 @@ StoreReport Store::Core::report() {
     report.documentIDsLeft = std::numeric_limits<std::uint32_t>::max() - lastDocument_;
     report.writeError = writeError_;
     report.reconcile = lastReconcile_;
+    withAbsolutePaths(report.reconcile.unreadableFolders);
+    withAbsolutePaths(report.reconcile.skippedMounts);
+    for (const auto& library : roots_.libraries()) {
+        report.libraries.push_back({library->key, library->path, library->problem});
+    }
     report.recorder = recorderReport_;
     report.recorder.isLive = recording_ == StoreOptions::Recording::live;
     if (watcher_) {
@@ -110,7 +124,9 @@ Expected<std::optional<Store::Core::Place>> Store::Core::standing(
     std::ranges::sort(places, {}, [](const Place& place) { return place.row.age(); });
     std::optional<Error> failure;
     for (Place& place : places) {
-        const auto stands = standsAt(root_.get(), device_, place.path, place.row);
+        const auto found = roots_.place(place.path);
+        const auto stands = found ? standsAt(found->folder(), device_, found->path, place.row)
+                                  : Expected<bool>(false);
         if (stands && *stands) {
             return std::optional(std::move(place));
         }
@@ -120,6 +136,12 @@ Expected<std::optional<Store::Core::Place>> Store::Core::standing(
     }
     return failure ? Expected<std::optional<Place>>(Unexpected(*failure))
                    : Expected<std::optional<Place>>(std::nullopt);
+}
+
+Expected<EntryLook> Store::Core::lookAt(const Place& place) const {
+    const auto found = roots_.place(place.path);
+    return found ? lookBeneath(found->folder(), found->path, place.row)
+                 : Unexpected(errorWithPOSIXCode(ENOENT, "look at", place.path));
 }
 
 Expected<std::string> Store::Core::pathForFileID(DeviceID device, FileID file) {
@@ -137,8 +159,9 @@ Expected<std::string> Store::Core::pathForFileID(DeviceID device, FileID file) {
             return Unexpected(found.error());
         }
         if (*found) {
-            const std::string& path = (*found)->path;
-            return path.empty() ? rootPath_ : rootPath_ + (rootPath_ == "/" ? "" : "/") + path;
+            if (auto path = roots_.absolutePath((*found)->path)) {
+                return std::move(*path);
+            }
         }
         if (!lastTry) {
             if (auto done = lookForMissing(); !done) {
@@ -195,7 +218,7 @@ DocumentID Store::Core::knownDocumentID(const EntryStatus& status) {
     }
     // Its ctime moved: only the handle tells whether the inode number is still the same file's.
     for (const Place& place : unproven) {
-        const auto look = lookBeneath(root_.get(), place.path, place.row);
+        const auto look = lookAt(place);
         if (look && look->status.changed == status.changed &&
             EntryMerger::isSameFile(place.row, *look, true)) {
             return DocumentID{place.row.document};

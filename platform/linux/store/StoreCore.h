@@ -20,6 +20,7 @@
 #include "platform/linux/store/Journal.h"
 #include "platform/linux/store/Mutex.h"
 #include "platform/linux/store/Reconciler.h"
+#include "platform/linux/store/RecordedRoots.h"
 #include "platform/linux/store/SafeSaves.h"
 #include "platform/linux/store/StateFolder.h"
 #include "platform/linux/store/Store.h"
@@ -57,7 +58,9 @@ class Store::Core {
     [[nodiscard]] EventHistory::Standing standingOf(EventID since) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<std::unique_ptr<EventCursor>> eventsSince(EventID since)
         MARROWDALE_EXCLUDES(mutex_);
-    [[nodiscard]] const std::string& rootPath() const { return rootPath_; }
+    [[nodiscard]] Expected<void> setLibraries(std::vector<LibraryFolder> libraries)
+        MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] std::vector<EventRoot> eventRoots() const;
     [[nodiscard]] DeviceID device() const { return device_; }
     [[nodiscard]] std::uint64_t addListener(std::function<void(EventHistory::News)> listener)
         MARROWDALE_EXCLUDES(listenersMutex_);
@@ -74,7 +77,7 @@ class Store::Core {
     // One name of a file, as the index has it.
     struct Place {
         RowNumber number = noRow;
-        std::string path;  // below the root
+        std::string path;  // as stored
         Row row{};
     };
     // What a look at the disk brought for one request.
@@ -88,6 +91,14 @@ class Store::Core {
          UniqueFD root);
 
     // Opening.
+    // Without links; the error where there is nothing.
+    [[nodiscard]] static Expected<std::string> canonicalPath(const std::string& path);
+    struct WantedLibrary {
+        LibraryFolder folder;
+        bool isRefused = false;  // by its key and path alone
+    };
+    [[nodiscard]] static std::vector<WantedLibrary> wantedLibraries(
+        std::vector<LibraryFolder> libraries, const std::string& rootPath);
     [[nodiscard]] Expected<void> lookAtFolders(const std::string& cacheFolder);
     [[nodiscard]] Expected<void> loadOrMake(const RootBinding& root);
     [[nodiscard]] Expected<std::string> load(const RootBinding& root);
@@ -96,10 +107,12 @@ class Store::Core {
     [[nodiscard]] Expected<void> loadJournal() MARROWDALE_REQUIRES(mutex_);
     void noteRoot(const RootBinding& root);
     void log(const std::string& text) const;
+    [[nodiscard]] const std::string& rootPath() const { return roots_.root().path; }
 
     // What the store itself writes to must not be indexed: it changes with each commit. The state
     // folder and the cache folder, where they are on the root's device now.
     [[nodiscard]] std::vector<FileID> unindexedFolders() const;
+    void withAbsolutePaths(std::vector<std::string>& storedPaths) const;
     [[nodiscard]] bool isUnindexed(const Request& request, std::span<const FileID> folders) const;
 
     // Bringing the index up to what is on disk (StoreUpdate.cpp). One pass runs at a time; requests
@@ -126,6 +139,7 @@ class Store::Core {
     [[nodiscard]] Expected<bool> drain(HintSet& hints) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<void> listUnwatched(const TreeScope& scope) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<void> checkRoot() MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<void> noteRootRow() MARROWDALE_EXCLUDES(mutex_);
     void noteRootProblem(const std::optional<Error>& problem) MARROWDALE_EXCLUDES(mutex_);
     void settle(SafeSaves::Knowledge knowledge) MARROWDALE_EXCLUDES(mutex_);
     void removeLimbo() MARROWDALE_REQUIRES(mutex_);
@@ -138,6 +152,31 @@ class Store::Core {
     [[nodiscard]] TreeScope scope() MARROWDALE_NO_THREAD_SAFETY_ANALYSIS;
     [[nodiscard]] Expected<void> commit() MARROWDALE_REQUIRES(mutex_);
     void writeSnapshotIfLong() MARROWDALE_REQUIRES(mutex_);
+
+    // The libraries (StoreLibraries.cpp): at each pass those that are wanted are looked for, as
+    // the root is.
+    struct Bound {
+        std::vector<RowNumber> fresh;  // nothing of these was ever known
+        bool mustLookAtAll = false;    // what was known of one must be compared
+    };
+    [[nodiscard]] Bound bindLibraries() MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] RecordedRoots::FolderPointer bound(
+        const WantedLibrary& library, const std::vector<RecordedRoots::FolderPointer>& others,
+        Bound& news) MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<EntryLook> openLibrary(
+        RecordedRoots::Folder& folder,
+        const std::vector<RecordedRoots::FolderPointer>& others) const;
+    void placeLibrary(const RecordedRoots::Folder& folder, const EntryLook& look, Bound& news)
+        MARROWDALE_EXCLUDES(mutex_);
+    void noteLibraryProblem(const RecordedRoots::Folder& folder,
+                            const RecordedRoots::FolderPointer& before);
+    void retireOthers(std::span<const WantedLibrary> wanted) MARROWDALE_EXCLUDES(mutex_);
+    void retire(RowNumber row, const Expected<EntryStatus>& standing) MARROWDALE_EXCLUDES(mutex_);
+    void unwatchTree(RowNumber folder) MARROWDALE_REQUIRES(mutex_);
+    // Lists those that are new. False when everything must be looked at.
+    [[nodiscard]] Expected<bool> followLibraries(const TreeScope& scope)
+        MARROWDALE_EXCLUDES(mutex_);
+    void tellReturnedLibraries() MARROWDALE_EXCLUDES(mutex_);
 
     // Listening (StoreRecorder.cpp).
     void startWatching();
@@ -152,13 +191,14 @@ class Store::Core {
         MARROWDALE_EXCLUDES(mutex_);
     void addPlace(RowNumber number, std::vector<Place>& places) MARROWDALE_REQUIRES(mutex_);
     [[nodiscard]] Expected<std::optional<Place>> standing(std::vector<Place>& places) const;
+    [[nodiscard]] Expected<EntryLook> lookAt(const Place& place) const;
 
     // Giving out.
     [[nodiscard]] Expected<bool> fillKnown(std::span<Request> requests,
                                            std::vector<std::size_t>& unknown)
         MARROWDALE_EXCLUDES(mutex_);
-    [[nodiscard]] std::optional<std::string> pathBelowRoot(std::string_view path) const;
-    [[nodiscard]] bool isRoot(const Request& request) const;
+    // The row of the root or library that is asked for itself; noRow for anything else.
+    [[nodiscard]] RowNumber rootRowOf(const Request& request) MARROWDALE_REQUIRES(mutex_);
     [[nodiscard]] Expected<void> refuseForeign(std::span<const Request> requests,
                                                std::span<const std::size_t> unknown) const;
     [[nodiscard]] Expected<UniqueFD> folderOf(const Request& request) const;
@@ -184,13 +224,11 @@ class Store::Core {
 
     const StateFolder state_;
     const StoreFolder folder_;
-    const std::string rootPath_;
     Log* const log_;
     const Journal::Options journalOptions_;
     const StoreLock lock_;
-    const UniqueFD root_;
-    DeviceID device_{};  // set while opening, as are those below
-    FileID rootID_{};
+    RecordedRoots roots_;
+    DeviceID device_{};        // set while opening, as are those below
     std::string cacheFolder_;  // canonical; empty when there is none
     StoreIdentity identity_;
 
@@ -198,7 +236,9 @@ class Store::Core {
     AttributeCarrier carrier_;
 
     Mutex mutex_;
-    std::condition_variable_any idle_;  // a pass ended
+    std::vector<WantedLibrary> wanted_ MARROWDALE_GUARDED_BY(mutex_);
+    bool wantedChanged_ MARROWDALE_GUARDED_BY(mutex_) = true;  // since a pass looked
+    std::condition_variable_any idle_;                         // a pass ended
     Index index_ MARROWDALE_GUARDED_BY(mutex_);
     EventBatch events_ MARROWDALE_GUARDED_BY(mutex_);  // not committed yet
     std::unique_ptr<Journal> journal_ MARROWDALE_GUARDED_BY(mutex_);

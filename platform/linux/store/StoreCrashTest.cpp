@@ -140,7 +140,9 @@ class StoreFullDiskTest : public testing::Test {
             ::umount2(state_.c_str(), MNT_DETACH);
         }
     }
-    [[nodiscard]] StoreOptions options() const { return {state_, "", root_, {}, nullptr}; }
+    [[nodiscard]] StoreOptions options() const {
+        return {.stateFolder = state_, .cacheFolder = "", .rootPath = root_};
+    }
     void fill() {
         std::string block(4096, 'f');
         try {

@@ -13,8 +13,7 @@ Expected<Store::Core::Request> Store::Core::requestFor(const std::string& path,
     if (status.device != device_) {
         return Unexpected(errorWithPOSIXCode(ENXIO, "identify", path));
     }
-    const std::string prefix = rootPath_ == "/" ? rootPath_ : rootPath_ + "/";
-    if (!path.starts_with(prefix) || path.size() == prefix.size()) {
+    if (!roots_.storedPath(path) || roots_.folderAt(status) != nullptr) {
         return Unexpected(errorWithPOSIXCode(ENOENT, "identify", path));
     }
     const std::string_view whole = path;

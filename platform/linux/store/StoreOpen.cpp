@@ -15,9 +15,7 @@
 
 namespace marrowdale::native {
 
-namespace {
-
-Expected<std::string> canonical(const std::string& path) {
+Expected<std::string> Store::Core::canonicalPath(const std::string& path) {
     char* resolved = ::realpath(path.c_str(), nullptr);
     if (resolved == nullptr) {
         return Unexpected(errorWithPOSIXCode(errno, "look at", path));
@@ -27,19 +25,17 @@ Expected<std::string> canonical(const std::string& path) {
     return text;
 }
 
-}  // namespace
-
 Store::Core::Core(const StoreOptions& options, StateFolder state, StoreFolder folder,
                   StoreLock lock, UniqueFD root)
     : state_(std::move(state)),
       folder_(std::move(folder)),
-      rootPath_(options.rootPath),
       log_(options.log),
       journalOptions_{options.retention, options.clock},
       lock_(std::move(lock)),
-      root_(std::move(root)),
+      roots_(options.rootPath, std::move(root)),
       packages_(options.packages != nullptr ? *options.packages : PackageTypes()),
       carrier_(options.carriedAttributePrefix),
+      wanted_(wantedLibraries(options.libraries, options.rootPath)),
       changes_(index_, packages_),
       saves_(index_, changes_),
       recording_(options.recording),
@@ -54,7 +50,7 @@ Expected<std::unique_ptr<Store::Core>> Store::Core::open(const StoreOptions& opt
     if (auto made = makeFolders(options.stateFolder); !made) {
         return Unexpected(made.error());
     }
-    auto state = canonical(options.stateFolder);
+    auto state = canonicalPath(options.stateFolder);
     if (!state) {
         return Unexpected(state.error());
     }
@@ -111,22 +107,22 @@ void Store::Core::log(const std::string& text) const {
 }
 
 Expected<void> Store::Core::lookAtFolders(const std::string& cacheFolder) {
-    const auto root = statEntry(root_.get(), "");
+    const auto root = statEntry(roots_.root().open.get(), "");
     if (!root) {
-        return Unexpected(errorWithPOSIXCode(root.error().code, "look at", rootPath_));
+        return Unexpected(errorWithPOSIXCode(root.error().code, "look at", rootPath()));
     }
     device_ = root->device;
-    rootID_ = root->fileID;
+    roots_.noteRoot(*root);
     // Made here, so that it is known from the first walk on; the journal says what is wrong with
     // it.
     cacheFolder_ = cacheFolder;
     if (!cacheFolder.empty() && makeFolders(cacheFolder)) {
-        cacheFolder_ = canonical(cacheFolder).value_or(cacheFolder);
+        cacheFolder_ = canonicalPath(cacheFolder).value_or(cacheFolder);
     }
     for (const FileID folder : unindexedFolders()) {
-        if (folder == rootID_) {
+        if (folder == root->fileID) {
             return Unexpected(
-                errorWithPOSIXCode(EINVAL, "keep state or caches in the root folder", rootPath_));
+                errorWithPOSIXCode(EINVAL, "keep state or caches in the root folder", rootPath()));
         }
     }
     return {};

@@ -1,10 +1,12 @@
 #pragma once
 
 #include <chrono>
+#include <compare>
 #include <cstdint>
 #include <functional>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "platform/foundation/Date.h"
 #include "platform/foundation/Log.h"
@@ -13,6 +15,15 @@
 #include "platform/linux/store/Retention.h"
 
 namespace marrowdale::native {
+
+// A folder that a store records beside its root: an application's documents.
+struct LibraryFolder {
+    // Names it for good: what was known of it is found again under it. 1 to 254 bytes, no "/".
+    std::string key;
+    std::string path;  // absolute, no links in it
+
+    friend auto operator<=>(const LibraryFolder&, const LibraryFolder&) = default;
+};
 
 // What a store is opened with. Paths are absolute.
 struct StoreOptions {
@@ -34,6 +45,9 @@ struct StoreOptions {
     std::string cacheFolder;
     // The folder whose tree is indexed, canonical (no links in it). Must exist and be a folder.
     std::string rootPath;
+    // Folders outside of the root whose trees are recorded beside it from the start; see
+    // Store::setLibraries.
+    std::vector<LibraryFolder> libraries = {};
     // How long to wait while another process has the store. Zero: not at all; no value: for ever.
     std::optional<std::chrono::milliseconds> lockWait = std::chrono::milliseconds(0);
     // Asked while another process has the store, whenever something appears in the state folder:

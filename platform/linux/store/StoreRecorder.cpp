@@ -22,7 +22,7 @@ constexpr int pauseAfterFailure = 1000;
 // Before the first walk, which watches each folder that it lists.
 void Store::Core::startWatching() {
     if (recording_ != StoreOptions::Recording::once) {
-        auto watcher = makeWatcher(root_.get(), watcherKind_);
+        auto watcher = makeWatcher(roots_.root().open.get(), watcherKind_);
         if (watcher) {
             watcher_ = std::move(*watcher);
         } else {
@@ -57,7 +57,7 @@ void Store::Core::record() {
     while (true) {
         if (::poll(waits.data(), waits.size(), -1) < 0 && errno != EINTR) {
             log("the recorder can't wait any more: " +
-                errorWithPOSIXCode(errno, "wait for", rootPath_).description());
+                errorWithPOSIXCode(errno, "wait for", rootPath()).description());
             return;
         }
         if (waits[1].revents != 0 || ::poll(&waits[1], 1, pauseMilliseconds) > 0) {
@@ -65,7 +65,7 @@ void Store::Core::record() {
         }
         const auto done = runOnce(Pass::hints);
         if (!done && wasWell) {
-            log("what happened in " + rootPath_ +
+            log("what happened in " + rootPath() +
                 " can't be recorded: " + done.error().description());
         }
         wasWell = done.has_value();

@@ -21,12 +21,20 @@ struct ReconcileReport {
     std::uint64_t folders = 0;      // that were listed
     std::uint64_t entries = 0;      // that were looked at
     std::uint64_t differences = 0;  // rows that were made, changed, moved or removed
-    // Paths, the first 100 of each kind; the counts are whole.
+    // Paths below the root, absolute ones in libraries; the first 100 of each kind, the counts are
+    // whole.
     std::vector<std::string> unreadableFolders;  // what was known below them is kept
     std::uint64_t unreadableFolderCount = 0;
     std::vector<std::string>
         skippedMounts;  // entries on which something is mounted, and subvolumes
     std::uint64_t skippedMountCount = 0;
+};
+
+// A folder that is recorded beside the root.
+struct LibraryReport {
+    std::string key;
+    std::string path;
+    std::optional<Error> problem;  // why it can't be recorded now; ENOENT: there is none
 };
 
 // How a store listens to what happens.
@@ -84,6 +92,7 @@ struct StoreReport {
     std::optional<Error> writeError;
     ReconcileReport reconcile;
     RecorderReport recorder;
+    std::vector<LibraryReport> libraries;
 };
 
 }  // namespace marrowdale::native

@@ -53,8 +53,7 @@ TreeScope Store::Core::scope() {
             .saves = saves_,
             .watches = *watches_,
             .carrier = carrier_,
-            .root = root_.get(),
-            .rootPath = rootPath_,
+            .roots = roots_,
             .device = device_,
             .skipped = unindexedFolders()};
 }
@@ -100,7 +99,7 @@ Expected<void> Store::Core::runOnce(Pass pass) {
         fullPassesStarted_ += pass == Pass::full ? 1 : 0;
     }
     // However the pass ends, those who wait go on.
-    Expected<void> done = Unexpected(errorWithPOSIXCode(ENOMEM, "look at", rootPath_));
+    Expected<void> done = Unexpected(errorWithPOSIXCode(ENOMEM, "look at", rootPath()));
     try {
         done = run(pass);
     } catch (const std::bad_alloc&) {
@@ -156,16 +155,36 @@ Expected<void> Store::Core::look(Pass pass) {
 
 // Another folder at the root's path, or none, is not to be taken for a tree that was emptied.
 Expected<void> Store::Core::checkRoot() {
-    const auto standing = statEntry(AT_FDCWD, rootPath_.c_str());
-    const auto held = statEntry(root_.get(), "");
+    const auto standing = statEntry(AT_FDCWD, rootPath().c_str());
+    const auto held = statEntry(roots_.root().open.get(), "");
     std::optional<Error> problem;
     if (!standing || !held || standing->fileID != held->fileID ||
         standing->device != held->device) {
         problem =
-            errorWithPOSIXCode(standing ? ESTALE : standing.error().code, "look at", rootPath_);
+            errorWithPOSIXCode(standing ? ESTALE : standing.error().code, "look at", rootPath());
     }
     noteRootProblem(problem);
     return problem ? Unexpected(*problem) : Expected<void>();
+}
+
+Expected<void> Store::Core::noteRootRow() {
+    const Date now = Date::now();
+    const int root = roots_.root().open.get();
+    const auto status = statEntry(root, "");
+    if (!status) {
+        return Unexpected(errorWithPOSIXCode(status.error().code, "look at", rootPath()));
+    }
+    const auto fingerprint = handleFingerprint(root, "");
+    const EntryLook look{*status, fingerprint ? *fingerprint : 0, now};
+    const MutexLock lock(mutex_);
+    if (index_.endOfRows() <= rootRow) {
+        (void)index_.add(noRow, {}, EntryMerger::valuesOf(look));
+    } else if (!EntryMerger::isUnchanged(index_.row(rootRow), *status)) {
+        Row values = EntryMerger::valuesOf(look);
+        values.set(Row::unreadable, index_.row(rootRow).has(Row::unreadable));
+        index_.update(rootRow, values);
+    }
+    return {};
 }
 
 void Store::Core::noteRootProblem(const std::optional<Error>& problem) {
@@ -196,6 +215,9 @@ Expected<bool> Store::Core::drain(HintSet& hints) {
 }
 
 Expected<bool> Store::Core::runHints(const TreeScope& scope) {
+    if (auto known = followLibraries(scope); !known || !*known) {
+        return known;
+    }
     if (auto listed = listUnwatched(scope); !listed) {
         return Unexpected(listed.error());
     }
@@ -228,6 +250,12 @@ Expected<bool> Store::Core::followHints(const TreeScope& scope) {
         for (const HintSet::Hint& hint : std::exchange(unreached, {})) {
             hints.add(hint);
         }
+        // What was read may be of a library that went, or came, just before.
+        if (!hints.empty()) {
+            if (auto known = followLibraries(scope); !known || !*known) {
+                return known;
+            }
+        }
         auto left = update.process(hints);
         if (!left) {
             return Unexpected(left.error());
@@ -253,7 +281,7 @@ bool Store::Core::anyStands(std::span<const RowNumber> folders) {
     for (const RowNumber number : folders) {
         std::string path;
         const Row& row = index_.row(number);
-        if (!row.isFree() && row.isFolder() && index_.path(number, path)) {
+        if (!row.isFree() && row.isFolder() && index_.path(number, path) && roots_.place(path)) {
             return true;
         }
     }
@@ -289,13 +317,18 @@ Expected<void> Store::Core::runFull(const TreeScope& scope) {
         isFresh = std::exchange(isFresh_, false);
         changes_.setSilent(isFresh);
     }
+    auto noted = noteRootRow();
+    if (noted) {
+        (void)bindLibraries();
+    }
     Reconciler reconciler(scope);
-    auto report = reconciler.run();
+    auto report = noted ? reconciler.run() : Unexpected(noted.error());
     if (!report) {
         const MutexLock lock(mutex_);
         isFresh_ = isFresh;
         return Unexpected(report.error());
     }
+    tellReturnedLibraries();
     // What happened under the walk was told; where too much happened, the next pass walks again.
     const auto whole = watcher_ ? followHints(scope) : Expected<bool>(true);
     if (!whole) {
@@ -339,8 +372,10 @@ void Store::Core::carryAttributes() {
             continue;
         }
         const Place& place = places.front();
-        const auto outcome =
-            carrier_.write(root_.get(), place.path, FileID{place.row.fileID}, transfer.attributes);
+        const auto found = roots_.place(place.path);
+        const auto outcome = found ? carrier_.write(found->folder(), found->path,
+                                                    FileID{place.row.fileID}, transfer.attributes)
+                                   : AttributeCarrier::Outcome::refused;
         if (outcome == AttributeCarrier::Outcome::refused) {
             left.push_back(std::move(transfer));
         } else if (outcome == AttributeCarrier::Outcome::written) {
@@ -351,7 +386,7 @@ void Store::Core::carryAttributes() {
 }
 
 void Store::Core::noteCarried(const Place& place, const CarriedAttributes& attributes) {
-    auto look = lookBeneath(root_.get(), place.path, place.row);
+    auto look = lookAt(place);
     const MutexLock lock(mutex_);
     if (look && EntryMerger::isSameFile(index_.row(place.number), *look, true)) {
         look->attributes = attributes;
@@ -393,7 +428,7 @@ void Store::Core::makeSure() {
     constexpr timespec tick{.tv_sec = 0, .tv_nsec = 11'000'000};
     ::clock_nanosleep(CLOCK_MONOTONIC, 0, &tick, nullptr);
     for (const Place& place : unsure) {
-        const auto look = lookBeneath(root_.get(), place.path, place.row);
+        const auto look = lookAt(place);
         if (!look) {
             continue;
         }

@@ -32,8 +32,24 @@ void TreeChanges::touch(RowNumber number, std::uint32_t bits) {
     row.set(bits, true);
 }
 
+void TreeChanges::appearedWithAllBelow(RowNumber folder) {
+    std::vector<RowNumber> left{folder};
+    while (!left.empty()) {
+        const RowNumber next = left.back();
+        left.pop_back();
+        appeared(next);
+        if (!index_.row(next).isFolder()) {
+            continue;
+        }
+        for (RowNumber below = index_.row(next).firstChild(); below != noRow;
+             below = index_.row(below).next) {
+            left.push_back(below);
+        }
+    }
+}
+
 bool TreeChanges::isPackage(RowNumber number) const {
-    return number != rootRow && index_.row(number).isFolder() &&
+    return !index_.isRoot(number) && index_.row(number).isFolder() &&
            packages_.isPackageName(index_.name(number));
 }
 

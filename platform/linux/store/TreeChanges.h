@@ -31,6 +31,7 @@ class TreeChanges {
 
     // Of placed rows.
     void appeared(RowNumber number) { touch(number, Row::touchedAppeared); }
+    void appearedWithAllBelow(RowNumber folder);
     void changed(RowNumber number) { touch(number, Row::touchedChanged); }
     // It stands where it stood, but was away for a moment. Whoever was told of it, or of something
     // below it, and looked in that moment, took it for gone.

@@ -25,8 +25,11 @@ std::string withoutEndingSlashes(std::string path) {
 }  // namespace
 
 StreamFilter::StreamFilter(const std::vector<std::string>& paths, std::optional<DeviceID> device,
-                           std::string rootPath, DeviceID rootDevice)
-    : rootPath_(withoutEndingSlashes(std::move(rootPath))) {
+                           std::vector<EventRoot> roots, DeviceID rootDevice)
+    : roots_(std::move(roots)) {
+    for (EventRoot& root : roots_) {
+        root.path = withoutEndingSlashes(std::move(root.path));
+    }
     for (const std::string& path : paths) {
         if (!device) {
             addFolder(path);
@@ -41,15 +44,20 @@ StreamFilter::StreamFilter(const std::vector<std::string>& paths, std::optional<
 void StreamFilter::addFolder(std::string path) {
     const bool isAbsolute = path.starts_with('/');
     path = withoutEndingSlashes(std::move(path));
-    if (isAbsolute && isAtOrBelow(path, rootPath_)) {
-        path.erase(0, rootPath_.size() + (path.size() > rootPath_.size() ? 1 : 0));
-        folders_.push_back(std::move(path));
-        return;
+    bool isInOne = false;
+    for (const EventRoot& root : roots_) {
+        if (isAbsolute && isAtOrBelow(path, root.path)) {
+            const std::string_view rest = std::string_view(path).substr(root.path.size());
+            folders_.push_back(root.prefix + std::string(root.prefix.empty() && !rest.empty()
+                                                             ? rest.substr(1)
+                                                             : rest));
+            recorded_ = recorded_ && root.isRecorded;
+            isInOne = true;
+        } else if (isAbsolute && isAtOrBelow(root.path, path)) {
+            folders_.push_back(root.prefix);  // what is recorded below it
+        }
     }
-    recorded_ = false;
-    if (isAbsolute && isAtOrBelow(rootPath_, path)) {
-        folders_.emplace_back();  // what is recorded below it
-    }
+    recorded_ = recorded_ && isInOne;
 }
 
 void StreamFilter::addFeed(std::string_view path) {
@@ -58,9 +66,19 @@ void StreamFilter::addFeed(std::string_view path) {
     recorded_ = recorded_ && isFeed;
 }
 
+// The root's own prefix is empty, and libraries do not lie below it.
 bool StreamFilter::isBelowOne(std::string_view path) const {
-    return std::ranges::any_of(
-        folders_, [path](const std::string& folder) { return isAtOrBelow(path, folder); });
+    return std::ranges::any_of(folders_, [path](const std::string& folder) {
+        return isAtOrBelow(path, folder) && (!folder.empty() || !path.starts_with('/'));
+    });
+}
+
+const EventRoot* StreamFilter::rootOf(std::string_view path) const {
+    const std::size_t end = std::min(path.find('/', 1), path.size());
+    const std::string_view prefix =
+        path.starts_with('/') ? path.substr(0, end) : std::string_view();
+    const auto found = std::ranges::find(roots_, prefix, &EventRoot::prefix);
+    return found == roots_.end() ? nullptr : &*found;
 }
 
 std::optional<FileEvent> StreamFilter::take(const StoredEvent& event) const {
@@ -73,10 +91,17 @@ std::optional<FileEvent> StreamFilter::take(const StoredEvent& event) const {
     out.flags = event.flags;
     if (isMove) {
         out.path = std::string(event.path);
-    } else if (event.path.empty()) {
-        out.path = rootPath_.empty() ? "/" : rootPath_;
     } else {
-        out.path = rootPath_ + "/" + std::string(event.path);
+        const EventRoot* root = rootOf(event.path);
+        if (root == nullptr) {
+            return std::nullopt;
+        }
+        const std::string_view rest = event.path.substr(root->prefix.size());
+        const bool needsSlash = !rest.empty() && !rest.starts_with('/');
+        out.path = root->path + (needsSlash ? "/" : "") + std::string(rest);
+        if (out.path->empty()) {
+            out.path = "/";
+        }
     }
     if (event.fileID != FileID{}) {
         out.fileID = event.fileID;

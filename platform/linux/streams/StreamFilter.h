@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "platform/foundation/Identifiers.h"
-#include "platform/linux/store/EventBatch.h"
+#include "platform/linux/store/EventHistory.h"
 #include "platform/services/FileEventService.h"
 
 namespace marrowdale::native {
@@ -16,9 +16,9 @@ namespace marrowdale::native {
 class StreamFilter {
   public:
     // A stream by path, or relative to a device, as in FileEventStreamRequest, over the history of
-    // the tree below `rootPath` on the volume `rootDevice`.
+    // these trees on the volume `rootDevice`.
     StreamFilter(const std::vector<std::string>& paths, std::optional<DeviceID> device,
-                 std::string rootPath, DeviceID rootDevice);
+                 std::vector<EventRoot> roots, DeviceID rootDevice);
 
     // Whether the history tells of everything that the stream asks for.
     [[nodiscard]] bool isRecorded() const { return recorded_; }
@@ -27,11 +27,12 @@ class StreamFilter {
 
   private:
     void addFolder(std::string path);
+    [[nodiscard]] const EventRoot* rootOf(std::string_view path) const;
     void addFeed(std::string_view path);
     [[nodiscard]] bool isBelowOne(std::string_view path) const;
 
-    const std::string rootPath_;
-    std::vector<std::string> folders_;  // below the root; empty: the root itself
+    std::vector<EventRoot> roots_;      // their paths without a "/" at the end
+    std::vector<std::string> folders_;  // as the paths of events are
     bool takesMoves_ = false;           // the feed of moved documents
     bool recorded_ = true;
 };

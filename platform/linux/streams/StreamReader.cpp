@@ -51,7 +51,7 @@ StreamReader::Step StreamReader::close() {
 
 void StreamReader::start(EventHistory& history, Step& step) {
     phase_ = Phase::history;
-    filter_.emplace(paths_, device_, history.rootPath(), history.device());
+    filter_.emplace(paths_, device_, history.roots(), history.device());
     const auto barrier = history.barrier();
     if (!barrier) {
         log(barrier.error());

@@ -26,6 +26,7 @@ class TestHistory final : public EventHistory {
 
     // Set before a stream is made.
     std::string root = "/served";
+    std::vector<EventRoot> libraries;
     std::optional<Error> barrierError;
     std::function<void()> duringBarrier;
     std::function<void()> duringEventsSince;
@@ -92,7 +93,11 @@ class TestHistory final : public EventHistory {
         }
         return world_.journal().eventsSince(since);
     }
-    std::string rootPath() override { return root; }
+    std::vector<EventRoot> roots() override {
+        std::vector<EventRoot> all{{{}, root, true}};
+        all.insert(all.end(), libraries.begin(), libraries.end());
+        return all;
+    }
     DeviceID device() override { return volume; }
     Expected<UUID> volumeUUID(const URL& /*url*/) override { return world_.uuid(); }
     std::uint64_t addListener(std::function<void(News)> listener) override {
