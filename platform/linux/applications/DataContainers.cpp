@@ -49,25 +49,25 @@ DataContainers::Container DataContainers::containerOf(std::string_view identifie
     if (!documents) {
         const int code = documents.error().code;
         if (code == EXDEV) {
-            return {Refusal::otherVolume, {}};
+            return {Refusal::otherVolume, {}, {}};
         }
-        return {code == EACCES ? Refusal::unreadable : Refusal::missing, {}};
+        return {code == EACCES ? Refusal::unreadable : Refusal::missing, {}, {}};
     }
     const auto status = statEntry(documents->get(), "");
     if (!status) {
         return {};
     }
     if (status->device != device_) {
-        return {Refusal::otherVolume, {}};
+        return {Refusal::otherVolume, {}, {}};
     }
     if (::faccessat(documents->get(), ".", R_OK | X_OK, AT_EACCESS) != 0) {
-        return {Refusal::unreadable, {}};
+        return {Refusal::unreadable, {}, {}};
     }
     const std::string served = path + "/" + std::string(documentsName);
     if (holds(served, storageRoot_) || holds(storageRoot_, served)) {
-        return {Refusal::overlapping, {}};
+        return {Refusal::overlapping, {}, {}};
     }
-    return {Refusal::none, path};
+    return {Refusal::none, path, status->fileID};
 }
 
 std::optional<std::string> DataContainers::identifierAt(std::string_view path) const {

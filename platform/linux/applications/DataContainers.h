@@ -33,7 +33,8 @@ class DataContainers {
     };
     struct Container {
         Refusal refusal = Refusal::missing;
-        std::string path;  // of the container; only without a refusal
+        std::string path;    // of the container; only without a refusal
+        FileID documents{};  // which folder its "Documents" is; the same
     };
     [[nodiscard]] Container containerOf(std::string_view identifier) const;
 

@@ -34,9 +34,17 @@ std::string_view words(Refusal refusal) {
 struct LinuxApplicationRegistry::Scan {
     DesktopEntryFolders::Entries entries;
     DataContainers containers;
-    std::vector<std::string> documentFolders;
+    std::vector<DocumentsFolder> documentFolders;
     std::vector<std::string> packageExtensions;
     std::vector<Refused> refused;
+
+    [[nodiscard]] std::vector<std::string> documentPaths() const {
+        std::vector<std::string> paths;
+        for (const auto& [path, folder] : documentFolders) {
+            paths.push_back(path);
+        }
+        return paths;
+    }
 };
 
 // The reader of files, which remembers them, for one thread at a time.
@@ -149,7 +157,8 @@ std::shared_ptr<const LinuxApplicationRegistry::Scan> LinuxApplicationRegistry::
                           std::back_inserter(scan->packageExtensions));
         auto container = scan->containers.containerOf(identifier);
         if (container.refusal == Refusal::none) {
-            scan->documentFolders.push_back(container.path + "/" + std::string(documentsName));
+            scan->documentFolders.emplace_back(container.path + "/" + std::string(documentsName),
+                                               container.documents);
         } else if (container.refusal != Refusal::missing) {
             scan->refused.push_back({identifier, container.refusal});
         }
@@ -167,7 +176,7 @@ std::shared_ptr<const LinuxApplicationRegistry::Scan> LinuxApplicationRegistry::
 void LinuxApplicationRegistry::tell(const Scan& scan) {
     tellRefusals(scan);
     if (options_.documentFoldersChanged && told_ != scan.documentFolders) {
-        options_.documentFoldersChanged(scan.documentFolders);
+        options_.documentFoldersChanged(scan.documentPaths());
     }
     told_ = scan.documentFolders;
 }
@@ -256,7 +265,7 @@ std::optional<PropertyListDictionary> LinuxApplicationRegistry::infoValuesForKey
 }
 
 std::vector<std::string> LinuxApplicationRegistry::documentFolders() {
-    return rescan()->documentFolders;
+    return rescan()->documentPaths();
 }
 
 std::vector<std::string> LinuxApplicationRegistry::packageExtensions() {

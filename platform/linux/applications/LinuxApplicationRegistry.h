@@ -7,6 +7,7 @@
 #include <set>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "platform/foundation/Log.h"
@@ -24,9 +25,9 @@ struct LinuxApplicationRegistryOptions {
     // The icon of that name (none: a generic one) for a variant, in the icon service's form. Null:
     // nobody has icons. Any thread.
     std::function<std::optional<Data>(const std::optional<std::string>& icon, int variant)> icons;
-    // Told which documents folders there are whenever they are others than before, before anybody
-    // else can learn of them; one call at a time, on the thread of whoever reads the registry,
-    // which waits for it. Null: nobody wants to know.
+    // Told which documents folders there are whenever they are others than before (another folder
+    // at the same path is another one), before anybody else can learn of them; one call at a time,
+    // on the thread of whoever reads the registry, which waits for it. Null: nobody wants to know.
     std::function<void(const std::vector<std::string>& paths)> documentFoldersChanged;
 };
 
@@ -73,6 +74,7 @@ class LinuxApplicationRegistry final : public ApplicationRegistry {
     struct Reader;
     [[nodiscard]] std::shared_ptr<const Scan> rescan();
     [[nodiscard]] std::shared_ptr<const Scan> scan();
+    using DocumentsFolder = std::pair<std::string, FileID>;  // where, and which
     void tell(const Scan& scan);
     void tellRefusals(const Scan& scan);
     [[nodiscard]] std::shared_ptr<const BundleRecord> record(std::string identifier);
@@ -82,9 +84,9 @@ class LinuxApplicationRegistry final : public ApplicationRegistry {
     std::mutex scanning_;
     std::unique_ptr<Reader> reader_;  // guarded by itself
     mutable std::mutex mutex_;
-    std::shared_ptr<const Scan> scan_;              // guarded by mutex_
-    std::optional<std::vector<std::string>> told_;  // guarded by scanning_
-    std::set<std::string> refusalsTold_;            // guarded by scanning_
+    std::shared_ptr<const Scan> scan_;                  // guarded by mutex_
+    std::optional<std::vector<DocumentsFolder>> told_;  // guarded by scanning_
+    std::set<std::string> refusalsTold_;                // guarded by scanning_
 };
 
 }  // namespace marrowdale::native

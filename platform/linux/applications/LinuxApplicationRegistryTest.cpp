@@ -284,6 +284,21 @@ TEST_F(LinuxApplicationRegistryTest, itsOwnerIsToldOfDocumentsFoldersBeforeAnybo
     EXPECT_EQ(told, (std::vector<Names>{{}, {container("org.example.A") + "/Documents"}, {}}));
 }
 
+TEST_F(LinuxApplicationRegistryTest, anotherFolderAtTheSamePathIsToldToo) {
+    writeFile(userEntry("org.example.A"), entry("A"));
+    makeContainer("org.example.A");
+    std::vector<Names> told;
+    auto withOwner = options();
+    withOwner.documentFoldersChanged = [&](const Names& paths) { told.push_back(paths); };
+    LinuxApplicationRegistry registry(withOwner);
+    (void)identifiers(registry, user);
+    fs::rename(container("org.example.A") + "/Documents", home("away"));
+    makeContainer("org.example.A");
+    (void)identifiers(registry, user);
+    const Names both{container("org.example.A") + "/Documents"};
+    EXPECT_EQ(told, (std::vector<Names>{both, both}));
+}
+
 TEST_F(LinuxApplicationRegistryTest, packageExtensionsComeFromAllApplications) {
     writeFile(userEntry("org.example.A"), entry("A", "X-KvPackageExtensions=note;sketch;\n"));
     writeFile(systemEntry("org.example.B"), entry("B", "X-KvPackageExtensions=note\n"));
