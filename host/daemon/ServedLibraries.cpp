@@ -1,0 +1,51 @@
+#include "host/daemon/ServedLibraries.h"
+
+#include <string_view>
+
+namespace marrowdale::host {
+
+std::vector<native::LibraryFolder> ServedLibraries::foldersAt(
+    const std::vector<std::string>& paths) {
+    std::vector<native::LibraryFolder> folders;
+    for (const std::string& path : paths) {
+        const std::string_view container = std::string_view(path).substr(0, path.rfind('/'));
+        folders.push_back({std::string(container.substr(container.rfind('/') + 1)), path});
+    }
+    return folders;
+}
+
+std::vector<std::string> ServedLibraries::rootsWith(const std::vector<std::string>& paths) const {
+    std::vector<std::string> roots{rootPath_};
+    roots.insert(roots.end(), paths.begin(), paths.end());
+    return roots;
+}
+
+void ServedLibraries::attach(native::Store& store, native::ServedTrees& trees,
+                             const std::vector<std::string>& paths, Log& log) {
+    const MutexLock lock(mutex_);
+    store_ = &store;
+    trees_ = &trees;
+    log_ = &log;
+    if (paths_ != paths) {
+        apply();
+    }
+}
+
+void ServedLibraries::set(const std::vector<std::string>& paths) {
+    const MutexLock lock(mutex_);
+    paths_ = paths;
+    if (store_ != nullptr) {
+        apply();
+    }
+}
+
+// Served first: what the store tells of is looked at.
+void ServedLibraries::apply() {
+    trees_->setRoots(rootsWith(paths_));
+    if (auto done = store_->setLibraries(foldersAt(paths_)); !done) {
+        log_->error("the documents of applications can't be recorded: " +
+                    done.error().description());
+    }
+}
+
+}  // namespace marrowdale::host
