@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cerrno>
 
 #include <fmt/format.h>
 
@@ -109,12 +110,15 @@ Finding pathsFinding(std::string name, std::string_view what, const std::vector<
             fmt::format("{} {}: {}", count, what, firstOf(paths, count)), std::move(advice)};
 }
 
-// Reports name what lies below the root by its path from there.
+// Reports name what lies below the root by its path from there, what lies elsewhere by its whole
+// path.
 std::vector<std::string> absolutePaths(const StoreReport& report,
                                        const std::vector<std::string>& paths) {
     std::vector<std::string> absolute;
     for (const std::string& path : paths) {
-        absolute.push_back(path.empty() ? report.rootPath : report.rootPath + "/" + path);
+        absolute.push_back(path.empty()            ? report.rootPath
+                           : path.starts_with('/') ? path
+                                                   : report.rootPath + "/" + path);
     }
     return absolute;
 }
@@ -131,6 +135,28 @@ Finding mountsFinding(const StoreReport& report, const std::vector<std::string>&
     }
     return pathsFinding("mounts", "other file systems or mounted folders skipped", paths, count,
                         "Everything served lies on one volume; name another root to serve these.");
+}
+
+// One that is not there has nothing to record.
+Finding librariesFinding(const StoreReport& report) {
+    std::size_t recorded = 0;
+    std::vector<std::string> refused;
+    for (const auto& library : report.libraries) {
+        recorded += library.problem ? 0U : 1U;
+        if (library.problem && library.problem->code != ENOENT) {
+            refused.push_back(library.path + " (" + library.problem->description() + ")");
+        }
+    }
+    if (refused.empty()) {
+        return {"libraries",
+                FindingStatus::ok,
+                fmt::format("the documents of {} applications are recorded", recorded),
+                {}};
+    }
+    return {"libraries", FindingStatus::note,
+            fmt::format("{} folders of applications can't be recorded: {}", refused.size(),
+                        firstOf(refused, refused.size())),
+            "Changes in them are not told; each is looked for again and again."};
 }
 
 // One state folder serves several root folders, each with a store of its own.
@@ -170,6 +196,7 @@ std::vector<Finding> storeFindings(const StoreReport& report,
             witnessFinding(report),
             writingFinding(report),
             mountsFinding(report, mounts),
+            librariesFinding(report),
             pathsFinding("unreadable-folders", "unreadable folders",
                          absolutePaths(report, last.unreadableFolders), last.unreadableFolderCount,
                          "What is in them is not served; give yourself permission to read them.")};

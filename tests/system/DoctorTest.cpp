@@ -59,6 +59,7 @@ TEST_P(DoctorTest, eachFindingIsALineWithNameStatusAndMessage) {
                              "rebuild",
                              "reconcile",
                              "mounts",
+                             "libraries",
                              "unreadable-folders",
                              "marks",
                              "unwatched-folders",
