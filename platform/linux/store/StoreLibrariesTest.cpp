@@ -1,9 +1,11 @@
 // Folders that are recorded beside the root: what happens in them is told, they come and go, and
 // what can't be recorded stands in nobody's way.
 
+#include <atomic>
 #include <cerrno>
 #include <filesystem>
 #include <sys/stat.h>
+#include <thread>
 #include <unistd.h>
 
 #include <gmock/gmock.h>
@@ -445,10 +447,66 @@ TEST_P(StoreLibrariesTest, ADocumentIsKnownInEachOfTwoStoresTurns) {
     EXPECT_THAT(newsOnce(), IsEmpty());
 }
 
+TEST_P(StoreLibrariesTest, OfTwoWithOneKeyTheLowerPathCounts) {
+    writeIn(a_, "note");
+    writeIn(b_, "note");
+    beginWith({{"key", folderOf(b_)}, {"key", folderOf(a_)}});
+    for (int i = 0; i < 2; ++i) {
+        writeIn(a_, "made" + std::to_string(i));
+        writeIn(b_, "unseen" + std::to_string(i));
+        EXPECT_THAT(newsOnce(), ElementsAre("appeared /key/made" + std::to_string(i)));
+    }
+}
+
+class StoreLibrariesLiveTest : public StoreLibrariesTest {};
+
+TEST_P(StoreLibrariesLiveTest, TheyComeAndGoWhileManyWriteAndAsk) {
+    constexpr int files = 200;
+    makeFolder(folderOf(a_));
+    makeFolder(folderOf(b_));
+    write("mine");
+    beginWith({library(b_)});
+    const auto mine = documentIn(root(), "mine");
+    std::atomic<bool> isDone = false;
+    std::thread writer([&] {
+        for (int i = 0; i < files; ++i) {
+            const std::string name = std::to_string(i);
+            writeIn(a_, name);
+            writeIn(b_, name);
+            fs::rename(folderOf(b_) + "/" + name, path("moved" + name));
+        }
+        isDone = true;
+    });
+    std::thread asker([&] {
+        while (!isDone) {
+            const auto file = store().resolveDocumentID(mine, device());
+            EXPECT_TRUE(file) << file.error().description();
+            (void)store().report();
+        }
+    });
+    for (int i = 0; !isDone || i < 10; ++i) {
+        serve(i % 2 == 0 ? std::vector{library(a_), library(b_)} : std::vector{library(b_)});
+    }
+    writer.join();
+    asker.join();
+    serve({library(a_), library(b_)});
+    (void)news();
+    for (int i = 0; i < files; ++i) {
+        const std::string name = std::to_string(i);
+        EXPECT_EQ(whereIs(documentIn(folderOf(a_), name)), folderOf(a_) + "/" + name);
+        EXPECT_EQ(pathOf(status("moved" + name).fileID), "moved" + name);
+    }
+    EXPECT_EQ(whereIs(mine), path("mine"));
+}
+
 INSTANTIATE_TEST_SUITE_P(OnEach, StoreLibrariesTest,
                          testing::Combine(testing::ValuesIn(testFileSystems()),
                                           testing::Values(Following::fanotify, Following::inotify,
                                                           Following::restart)),
+                         nameOf);
+INSTANTIATE_TEST_SUITE_P(OnEach, StoreLibrariesLiveTest,
+                         testing::Combine(testing::ValuesIn(testFileSystems()),
+                                          testing::Values(Following::fanotify, Following::inotify)),
                          nameOf);
 
 }  // namespace
