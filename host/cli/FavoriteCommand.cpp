@@ -6,8 +6,6 @@
 #include <optional>
 #include <string_view>
 
-#include <CLI/App.hpp>
-
 namespace marrowdale::host {
 
 namespace {
@@ -36,30 +34,9 @@ std::optional<Number> numberIn(std::string_view text) {
 
 }  // namespace
 
-void FavoriteCommand::declareArguments(CLI::App& arguments) {
-    arguments.add_option("ITEM", item_, "A path, a word, or an identifier")->required();
-    arguments.add_option("RANK", rank_, "A number");
-    arguments.add_flag("--clear", clears_, "Take the rank away");
-}
-
-std::expected<ItemAction, Failure> FavoriteCommand::action(CommandContext& context) {
-    if (clears_ == !rank_.empty()) {
-        return std::unexpected(Failure::commandLine("favorite wants either a RANK or --clear"));
-    }
-    ItemAction action;
-    action.kind = ItemAction::Kind::favorite;
-    if (!clears_) {
-        action.rank = numberIn(rank_);
-        if (!action.rank) {
-            return std::unexpected(Failure::commandLine("no number: " + rank_));
-        }
-    }
-    auto found = identifier(context, item_);
-    if (!found) {
-        return std::unexpected(found.error());
-    }
-    action.item = std::move(*found);
-    return action;
+bool FavoriteCommand::take(const std::string& text, ItemAction& action) const {
+    action.rank = numberIn(text);
+    return action.rank.has_value();
 }
 
 }  // namespace marrowdale::host

@@ -1,27 +1,24 @@
 #pragma once
 
-#include <string>
-
-#include "host/cli/ActionCommand.h"
+#include "host/cli/ValueCommand.h"
 
 namespace marrowdale::host {
 
 // `favorite ITEM RANK` / `favorite ITEM --clear`.
-class FavoriteCommand final : public ActionCommand {
+class FavoriteCommand final : public ValueCommand {
   public:
+    FavoriteCommand()
+        : ValueCommand(
+              ItemAction::Kind::favorite,
+              {.value = "RANK", .valueHelp = "A number", .clearHelp = "Take the rank away"}) {}
     [[nodiscard]] std::string_view name() const override { return "favorite"; }
     [[nodiscard]] std::string_view summary() const override {
         return "Set or clear an item's favourite rank";
     }
-    void declareArguments(CLI::App& arguments) override;
 
   protected:
-    [[nodiscard]] std::expected<ItemAction, Failure> action(CommandContext& context) override;
-
-  private:
-    std::string item_;
-    std::string rank_;
-    bool clears_ = false;
+    [[nodiscard]] bool take(const std::string& text, ItemAction& action) const override;
+    [[nodiscard]] std::string_view complaint() const override { return "no number"; }
 };
 
 }  // namespace marrowdale::host
