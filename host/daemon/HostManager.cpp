@@ -20,11 +20,21 @@ void HostManager::signalEnumeratorForContainerItemIdentifier(
 }
 
 void HostManager::deleteIndexedItemsInDomains(
-    std::vector<std::string> /*domainIdentifiers*/,
+    std::vector<std::string> domainIdentifiers,
     std::function<void(const std::optional<Error>&)> completionHandler) {
-    if (completionHandler) {
-        deletions_.async([handler = std::move(completionHandler)] { handler(std::nullopt); });
-    }
+    deletions_.async([this, domains = std::move(domainIdentifiers),
+                      handler = std::move(completionHandler)]() mutable {
+        if (cleaner_) {
+            cleaner_(std::move(domains));
+        }
+        if (handler) {
+            handler(std::nullopt);
+        }
+    });
+}
+
+void HostManager::setIndexCleaner(IndexCleaner cleaner) {
+    deletions_.sync([&] { cleaner_ = std::move(cleaner); });
 }
 
 void HostManager::finishHandlers() const {

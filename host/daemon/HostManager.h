@@ -23,10 +23,16 @@ class HostManager final : public FileProviderManager {
         std::string_view containerItemIdentifier,
         std::function<void(const std::optional<Error>&)> completionHandler) override;
 
-    // There is no search index, so there is nothing to take out of it.
+    // The host's search index is its replica; see `setIndexCleaner`. Always answered, and without
+    // an error.
     void deleteIndexedItemsInDomains(
         std::vector<std::string> domainIdentifiers,
         std::function<void(const std::optional<Error>&)> completionHandler) override;
+
+    // Takes the items of domains out of the index, on a queue of its own; null (as at first) for
+    // nobody, who is not called any more when this returns. Must not wait for an extension.
+    using IndexCleaner = std::function<void(std::vector<std::string> domainIdentifiers)>;
+    void setIndexCleaner(IndexCleaner cleaner);
 
     // Where signals arrive.
     [[nodiscard]] SignalHub& signals() { return signals_; }
@@ -39,6 +45,7 @@ class HostManager final : public FileProviderManager {
     URL documentStorageURL_;
     SignalHub signals_;
     SerialQueue handlers_;
+    IndexCleaner cleaner_;   // on deletions_
     SerialQueue deletions_;  // waits for nobody, for a provider may wait for it
 };
 

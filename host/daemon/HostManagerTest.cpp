@@ -29,5 +29,36 @@ TEST(HostManagerTest, theStorageRootIsTheOneItWasMadeWith) {
               URL::fileURL("/home/u/Documents"));
 }
 
+TEST(HostManagerTest, domainsAreTakenOutOfTheIndexBeforeTheAnswerAndNotOnTheCallersThread) {
+    HostManager manager("/home/u/Documents");
+    std::vector<std::string> removed;
+    std::thread::id thread;
+    manager.setIndexCleaner([&](const std::vector<std::string>& domains) {
+        removed = domains;
+        thread = std::this_thread::get_id();
+    });
+    std::size_t removedBefore = 0;
+    bool isRight = false;
+    manager.deleteIndexedItemsInDomains({"#a", "#b"}, [&](const std::optional<Error>& error) {
+        isRight = !error;
+        removedBefore = removed.size();
+    });
+    manager.finishHandlers();
+    EXPECT_TRUE(isRight);
+    EXPECT_EQ(removedBefore, 2U);
+    EXPECT_NE(thread, std::this_thread::get_id());
+}
+
+TEST(HostManagerTest, anIndexThatNobodyCleansIsAnsweredToo) {
+    HostManager manager("/home/u/Documents");
+    int answers = 0;
+    manager.setIndexCleaner([&](const std::vector<std::string>&) { answers += 100; });
+    manager.setIndexCleaner(nullptr);
+    manager.deleteIndexedItemsInDomains({"#a"}, [&](const auto&) { ++answers; });
+    manager.deleteIndexedItemsInDomains({"#a"}, nullptr);
+    manager.finishHandlers();
+    EXPECT_EQ(answers, 1);
+}
+
 }  // namespace
 }  // namespace marrowdale::host

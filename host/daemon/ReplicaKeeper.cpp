@@ -1,8 +1,11 @@
 #include "host/daemon/ReplicaKeeper.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <filesystem>
+#include <iterator>
 #include <system_error>
+#include <utility>
 
 #include "platform/hostframework/FileProviderConstants.h"
 
@@ -55,8 +58,25 @@ Expected<std::vector<FileProviderItemPtr>> ReplicaKeeper::search(
     });
 }
 
-Expected<void> ReplicaKeeper::removeDomains(std::span<const std::string> domains) {
-    return withReplica([&](Replica& replica) { return replica.removeDomains(domains); });
+void ReplicaKeeper::removeDomains(std::vector<std::string> domains) {
+    const MutexLock lock(domainsMutex_);
+    std::ranges::move(domains, std::back_inserter(leavingDomains_));
+}
+
+Expected<void> ReplicaKeeper::removeLeavingDomains(Replica& replica) {
+    std::vector<std::string> domains;
+    {
+        const MutexLock lock(domainsMutex_);
+        std::swap(domains, leavingDomains_);
+    }
+    if (domains.empty()) {
+        return {};
+    }
+    auto removed = replica.removeDomains(domains);
+    if (!removed) {
+        removeDomains(std::move(domains));
+    }
+    return removed;
 }
 
 Expected<void> ReplicaKeeper::follow(Replica& replica) {
@@ -87,6 +107,10 @@ Expected<bool> ReplicaKeeper::followFrom(Replica& replica, Data anchor) {
         if (!changes) {
             return changes.error() == errorSyncAnchorExpired() ? Expected<bool>(false)
                                                                : Unexpected(changes.error());
+        }
+        // Before the answer: what came back since is in it.
+        if (auto removed = removeLeavingDomains(replica); !removed) {
+            return Unexpected(removed.error());
         }
         // An answer that brings nothing is not worth a write.
         if (changes->anchor != anchor || !changes->updated.empty() || !changes->deleted.empty()) {

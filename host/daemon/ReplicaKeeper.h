@@ -25,7 +25,10 @@ class ReplicaKeeper {
     // Catches up, then answers what Replica::search does.
     [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> search(
         std::span<const std::string> words);
-    [[nodiscard]] Expected<void> removeDomains(std::span<const std::string> domains);
+    // The items of these domains are not found any more. Waits for nobody: whoever brings the
+    // replica up to date may be waited for, and may be waiting for this. They are taken out before
+    // anything else is found.
+    void removeDomains(std::vector<std::string> domains);
 
   private:
     // Does the work on the replica; one that turns out to be damaged is made anew and the work
@@ -33,6 +36,7 @@ class ReplicaKeeper {
     template <typename Work>
     auto withReplica(const Work& work) -> decltype(work(std::declval<Replica&>()));
     [[nodiscard]] Expected<void> follow(Replica& replica);
+    [[nodiscard]] Expected<void> removeLeavingDomains(Replica& replica);
     // False when the anchor has expired.
     [[nodiscard]] Expected<bool> followFrom(Replica& replica, Data anchor);
     [[nodiscard]] Expected<void> gather(Replica& replica);
@@ -40,6 +44,8 @@ class ReplicaKeeper {
     ItemRequests& items_;
     FeedRequests& feed_;
     const std::string path_;
+    Mutex domainsMutex_;
+    std::vector<std::string> leavingDomains_ MARROWDALE_GUARDED_BY(domainsMutex_);
     Mutex mutex_;
     std::optional<Replica> replica_ MARROWDALE_GUARDED_BY(mutex_);
 };

@@ -66,6 +66,7 @@ class World::Parts {
                     .imageEncoder = imageEncoder_} {}
 
     ~Parts() {
+        manager_.setIndexCleaner(nullptr);
         // Handlers refer to the extension.
         fileOperations_.finish();
         manager_.finishHandlers();
@@ -93,6 +94,9 @@ class World::Parts {
                           .replicaPath = options_.settings.stateFolder + "/replica.sqlite",
                           .stateFolder = options_.settings.stateFolder,
                           .findings = [this] { return findings(); }});
+        manager_.setIndexCleaner([this](std::vector<std::string> domains) {
+            requests_->replica().removeDomains(std::move(domains));
+        });
         return {};
     }
 
