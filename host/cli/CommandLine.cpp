@@ -5,6 +5,8 @@
 #include <unistd.h>
 
 #include "host/cli/AnchorCommand.h"
+#include "host/cli/AppCommand.h"
+#include "host/cli/AppsCommand.h"
 #include "host/cli/ChangesCommand.h"
 #include "host/cli/DeleteCommand.h"
 #include "host/cli/DoctorCommand.h"
@@ -19,10 +21,12 @@
 #include "host/cli/PageCommand.h"
 #include "host/cli/PathCommand.h"
 #include "host/cli/PurgeCommand.h"
+#include "host/cli/RefreshCommand.h"
 #include "host/cli/RenameCommand.h"
 #include "host/cli/SearchCommand.h"
 #include "host/cli/ServeCommand.h"
 #include "host/cli/TagCommand.h"
+#include "host/cli/ThumbnailCommand.h"
 #include "host/cli/TrashCommand.h"
 #include "host/cli/UntrashCommand.h"
 #include "host/cli/UsedCommand.h"
@@ -64,6 +68,10 @@ std::vector<std::unique_ptr<Command>> allCommands() {
     commands.push_back(std::make_unique<FavoriteCommand>());
     commands.push_back(std::make_unique<UsedCommand>());
     commands.push_back(std::make_unique<PurgeCommand>());
+    commands.push_back(std::make_unique<AppsCommand>());
+    commands.push_back(std::make_unique<AppCommand>());
+    commands.push_back(std::make_unique<RefreshCommand>());
+    commands.push_back(std::make_unique<ThumbnailCommand>());
     commands.push_back(std::make_unique<ServeCommand>());
     commands.push_back(std::make_unique<DoctorCommand>());
     return commands;

@@ -13,6 +13,7 @@ namespace marrowdale::host {
 namespace {
 
 constexpr unsigned statusOK = 200;
+constexpr unsigned statusNoContent = 204;
 
 std::string encoded(std::string_view text) {
     std::string result = percentEncodedPath(text);
@@ -144,12 +145,58 @@ Expected<std::vector<FileProviderItemPtr>> RemoteRequests::search(
     for (const std::string& word : words) {
         target += (target.contains('?') ? "&word=" : "?word=") + encoded(word);
     }
+    return itemsAt(std::move(target));
+}
+
+Expected<std::vector<FileProviderItemPtr>> RemoteRequests::itemsAt(std::string target) {
     const auto body = get(std::move(target));
     auto page = body ? pageFromJson(*body) : Unexpected(body.error());
     if (!page) {
         return Unexpected(page.error());
     }
     return std::move(page->items);
+}
+
+Expected<std::vector<FileProviderItemPtr>> RemoteRequests::appLibraries() {
+    return itemsAt("/v1/apps");
+}
+
+Expected<FileProviderItemPtr> RemoteRequests::applicationContainer(
+    std::string_view bundleIdentifier) {
+    const auto body = get("/v1/apps/" + encoded(bundleIdentifier));
+    return body ? itemFromJson(*body) : Unexpected(body.error());
+}
+
+Expected<void> RemoteRequests::refreshApplications() {
+    const std::lock_guard lock(mutex_);
+    const auto body = bodyOf(connection_->send({.method = "POST", .target = "/v1/refresh"}));
+    return body ? Expected<void>() : Unexpected(body.error());
+}
+
+Expected<std::vector<Thumbnail>> RemoteRequests::thumbnails(
+    const std::vector<std::string>& identifiers) {
+    std::vector<Thumbnail> thumbnails;
+    for (const std::string& identifier : identifiers) {
+        auto data = thumbnail(identifier);
+        if (!data) {
+            return Unexpected(data.error());
+        }
+        thumbnails.push_back({identifier, std::move(*data)});
+    }
+    return thumbnails;
+}
+
+Expected<std::optional<Data>> RemoteRequests::thumbnail(std::string_view identifier) {
+    const std::lock_guard lock(mutex_);
+    auto answer = connection_->send({.target = itemTarget(identifier, "/thumbnail")});
+    if (answer && answer->status == statusNoContent) {
+        return std::nullopt;
+    }
+    const auto picture = bodyOf(std::move(answer));
+    if (!picture) {
+        return Unexpected(picture.error());
+    }
+    return Data::fromText(*picture);
 }
 
 Expected<FileProviderItemPtr> RemoteRequests::perform(const ItemAction& action,

@@ -42,6 +42,12 @@ class RemoteRequests final : public HostRequests {
     [[nodiscard]] Expected<FileProviderItemPtr> perform(const ItemAction& action,
                                                         ActionObserver& observer,
                                                         const std::stop_token& stop) override;
+    [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> appLibraries() override;
+    [[nodiscard]] Expected<FileProviderItemPtr> applicationContainer(
+        std::string_view bundleIdentifier) override;
+    [[nodiscard]] Expected<void> refreshApplications() override;
+    [[nodiscard]] Expected<std::vector<Thumbnail>> thumbnails(
+        const std::vector<std::string>& identifiers) override;
     [[nodiscard]] Expected<std::vector<Finding>> findings() override;
 
   private:
@@ -51,6 +57,8 @@ class RemoteRequests final : public HostRequests {
 
     // The body of a good answer; the service's error otherwise.
     [[nodiscard]] Expected<std::string> get(std::string target);
+    [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> itemsAt(std::string target);
+    [[nodiscard]] Expected<std::optional<Data>> thumbnail(std::string_view identifier);
 
     const std::string stateFolder_;
     std::uint64_t processID_ = 0;

@@ -14,6 +14,7 @@ namespace marrowdale::host {
 
 namespace {
 
+constexpr unsigned noContent = 204;
 constexpr unsigned badRequest = 400;
 constexpr unsigned notFound = 404;
 constexpr unsigned methodNotAllowed = 405;
@@ -49,6 +50,10 @@ ApiAnswer refused(unsigned status, int code, std::string_view what) {
 template <typename T, typename Text>
 ApiAnswer answerOf(const Expected<T>& result, const Text& text) {
     return result ? ApiAnswer{.body = text(*result)} : failed(result.error());
+}
+
+std::string itemsJson(const std::vector<FileProviderItemPtr>& items) {
+    return pageJson({.items = items, .nextPage = std::nullopt});
 }
 
 // A page or an anchor from the request's query; none for text that is no token.
@@ -135,6 +140,9 @@ ApiAnswer Api::answerTo(const ApiRequest& request) {
     if (path.size() < 2 || path[0] != "v1") {
         return refused(notFound, ENOENT, "find that resource");
     }
+    if (path[1] == "refresh" && path.size() == 2) {
+        return refresh(request);
+    }
     if (request.method != "GET") {
         return refused(methodNotAllowed, ENOTSUP, "do that to this resource");
     }
@@ -145,10 +153,10 @@ ApiAnswer Api::answerTo(const ApiRequest& request) {
         return lookUp(request);
     }
     if (path[1] == "search" && path.size() == 2) {
-        return answerOf(requests_.search(request.parameters("word")),
-                        [](const std::vector<FileProviderItemPtr>& items) {
-                            return pageJson({.items = items, .nextPage = std::nullopt});
-                        });
+        return answerOf(requests_.search(request.parameters("word")), itemsJson);
+    }
+    if (path[1] == "apps" && path.size() <= 3) {
+        return applicationsAnswer(request);
     }
     if (path[1] == "findings" && path.size() == 2) {
         return answerOf(requests_.findings(), findingsJson);
@@ -178,6 +186,9 @@ ApiAnswer Api::itemAnswer(const ApiRequest& request) {
     }
     if (view == "changes") {
         return changesOf(request);
+    }
+    if (view == "thumbnail") {
+        return thumbnailOf(identifier);
     }
     return refused(notFound, ENOENT, "find that resource");
 }
@@ -210,6 +221,34 @@ ApiAnswer Api::lookUp(const ApiRequest& request) {
     return answerOf(requests_.identifierAt(*path), [](const std::string& identifier) {
         return textJson("itemIdentifier", identifier);
     });
+}
+
+ApiAnswer Api::thumbnailOf(const std::string& identifier) {
+    const auto thumbnails = requests_.thumbnails({identifier});
+    if (!thumbnails) {
+        return failed(thumbnails.error());
+    }
+    const auto& data = thumbnails->front().data;
+    if (!data) {
+        return {.status = noContent, .body = {}};
+    }
+    return {.body = data->text(), .contentType = "image/png"};
+}
+
+ApiAnswer Api::applicationsAnswer(const ApiRequest& request) {
+    if (request.path.size() == 2) {
+        return answerOf(requests_.appLibraries(), itemsJson);
+    }
+    return answerOf(requests_.applicationContainer(request.path[2]),
+                    [](const FileProviderItemPtr& item) { return itemJson(*item); });
+}
+
+ApiAnswer Api::refresh(const ApiRequest& request) {
+    if (request.method != "POST") {
+        return refused(methodNotAllowed, ENOTSUP, "do that to this resource");
+    }
+    const auto refreshed = requests_.refreshApplications();
+    return refreshed ? ApiAnswer{.body = "{}"} : failed(refreshed.error());
 }
 
 void Api::act(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply) {

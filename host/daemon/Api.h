@@ -23,6 +23,9 @@ class Api {
     [[nodiscard]] ApiAnswer childrenOf(const ApiRequest& request);
     [[nodiscard]] ApiAnswer changesOf(const ApiRequest& request);
     [[nodiscard]] ApiAnswer lookUp(const ApiRequest& request);
+    [[nodiscard]] ApiAnswer thumbnailOf(const std::string& identifier);
+    [[nodiscard]] ApiAnswer applicationsAnswer(const ApiRequest& request);
+    [[nodiscard]] ApiAnswer refresh(const ApiRequest& request);
     void act(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply);
     void signals(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply);
 

@@ -1,6 +1,7 @@
 #include "host/daemon/AppRefreshRequests.h"
 
 #include <cstdint>
+#include <utility>
 
 #include "platform/foundation/Mutex.h"
 
@@ -9,10 +10,21 @@ namespace marrowdale::host {
 // How many refreshes were done.
 class AppRefreshRequests::Count {
   public:
-    void increase() {
-        const MutexLock lock(mutex_);
-        ++count_;
-        increased_.notifyAll();
+    explicit Count(std::function<void()> refreshed) : refreshed_(std::move(refreshed)) {}
+
+    void oneWasDone() {
+        {
+            const MutexLock lock(telling_);
+            if (refreshed_) {
+                refreshed_();
+            }
+        }
+        increase();
+    }
+    // Waits for a call of `refreshed` that is running.
+    void tellNobody() {
+        const MutexLock lock(telling_);
+        refreshed_ = nullptr;
     }
     [[nodiscard]] std::uint64_t now() {
         const MutexLock lock(mutex_);
@@ -26,14 +38,27 @@ class AppRefreshRequests::Count {
     }
 
   private:
+    void increase() {
+        const MutexLock lock(mutex_);
+        ++count_;
+        increased_.notifyAll();
+    }
+    Mutex telling_;
+    std::function<void()> refreshed_ MARROWDALE_GUARDED_BY(telling_);
     Mutex mutex_;
     Condition increased_;
     std::uint64_t count_ MARROWDALE_GUARDED_BY(mutex_) = 0;
 };
 
-AppRefreshRequests::AppRefreshRequests(FileProviderApplications& extension)
-    : extension_(extension), count_(std::make_shared<Count>()) {
-    extension_._refreshInstalledAppsWithCompletionHandler([count = count_] { count->increase(); });
+AppRefreshRequests::AppRefreshRequests(FileProviderApplications& extension,
+                                       std::function<void()> refreshed)
+    : extension_(extension), count_(std::make_shared<Count>(std::move(refreshed))) {
+    extension_._refreshInstalledAppsWithCompletionHandler(
+        [count = count_] { count->oneWasDone(); });
+}
+
+void AppRefreshRequests::stopTelling() {
+    count_->tellNobody();
 }
 
 void AppRefreshRequests::waitForFirst() {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 
 #include "platform/hostframework/FileProviderApplications.h"
@@ -11,8 +12,13 @@ namespace marrowdale::host {
 // outlives no extension.
 class AppRefreshRequests {
   public:
-    // Asks for a first refresh.
-    explicit AppRefreshRequests(FileProviderApplications& extension);
+    // Asks for a first refresh. `refreshed` (may be null) is called after every refresh, before
+    // those who wait for it go on, on the extension's own queue; never after this object is gone.
+    explicit AppRefreshRequests(FileProviderApplications& extension,
+                                std::function<void()> refreshed = nullptr);
+    ~AppRefreshRequests() { stopTelling(); }
+    AppRefreshRequests(const AppRefreshRequests&) = delete;
+    AppRefreshRequests& operator=(const AppRefreshRequests&) = delete;
 
     // Returns once that first refresh, or any later one, was done.
     void waitForFirst();
@@ -20,6 +26,8 @@ class AppRefreshRequests {
     void ask();
     // Asks for a refresh and returns once one that began after the call was done.
     void refreshNow();
+    // `refreshed` is called no more; waits for a call of it that is running.
+    void stopTelling();
 
   private:
     class Count;

@@ -1,6 +1,8 @@
 #include "host/daemon/LocalRequests.h"
 
 #include <cstdlib>
+#include <future>
+#include <utility>
 
 #include "host/daemon/ChangesCollector.h"
 #include "host/daemon/LocalListing.h"
@@ -9,6 +11,9 @@
 namespace marrowdale::host {
 
 namespace {
+
+// Identifiers of app libraries begin so.
+constexpr char libraryPrefix = '#';
 
 bool isSystemContainer(std::string_view identifier) {
     return identifier == VantrelRootContainerItemIdentifier ||
@@ -40,7 +45,14 @@ bool isStorageRoot(const std::string& path, const std::string& rootPath) {
 
 }  // namespace
 
+LocalRequests::LocalRequests(LocalServices services)
+    : services_(std::move(services)),
+      actions_(services_.extension, services_.rootPath, services_.stateFolder),
+      replica_(*this, *this, services_.replicaPath),
+      libraries_(services_.extension, [this] { renewWatches(); }) {}
+
 Expected<FileProviderItemPtr> LocalRequests::item(std::string_view identifier) {
+    libraries_.waitUntilKnown();
     return services_.extension.itemForIdentifier(identifier);
 }
 
@@ -48,6 +60,7 @@ Expected<std::string> LocalRequests::identifierAt(std::string_view path) {
     if (isStorageRoot(std::string(path), services_.rootPath)) {
         return std::string(VantrelRootContainerItemIdentifier);
     }
+    libraries_.waitUntilKnown();
     auto identifier = services_.extension.persistentIdentifierForItemAtURL(URL::fileURL(path));
     if (!identifier) {
         return Unexpected(errorForNonExistentItem(path));
@@ -56,6 +69,7 @@ Expected<std::string> LocalRequests::identifierAt(std::string_view path) {
 }
 
 Expected<std::string> LocalRequests::pathOf(std::string_view identifier) {
+    libraries_.waitUntilKnown();
     const auto url = services_.extension.URLForItemWithPersistentIdentifier(identifier);
     if (!url) {
         return Unexpected(errorForNonExistentItem(identifier));
@@ -73,6 +87,7 @@ Expected<std::unique_ptr<ItemListing>> LocalRequests::listing(std::string_view c
 
 Expected<std::unique_ptr<FileProviderEnumerator>> LocalRequests::enumeratorOf(
     std::string_view container) {
+    libraries_.waitUntilKnown();
     if (!isSystemContainer(container)) {
         const auto folder = item(container);
         if (!folder) {
@@ -86,7 +101,7 @@ Expected<std::unique_ptr<FileProviderEnumerator>> LocalRequests::enumeratorOf(
 }
 
 Expected<std::optional<Data>> LocalRequests::anchor(std::string_view container) {
-    const auto enumerator = enumeratorOf(container);
+    auto enumerator = enumeratorOf(container);
     if (!enumerator) {
         return Unexpected(enumerator.error());
     }
@@ -94,31 +109,79 @@ Expected<std::optional<Data>> LocalRequests::anchor(std::string_view container) 
     (*enumerator)->currentSyncAnchorWithCompletionHandler([&](const std::optional<Data>& current) {
         anchor = current;
     });
-    (*enumerator)->invalidate();
+    release(container, anchor, std::move(*enumerator));
     return anchor;
 }
 
 Expected<ItemChanges> LocalRequests::changes(std::string_view container, const Data& since) {
-    const auto enumerator = enumeratorOf(container);
+    libraries_.waitUntilKnown();
+    auto enumerator = kept_.take(container, since);
     if (!enumerator) {
-        return Unexpected(enumerator.error());
+        auto fresh = enumeratorOf(container);
+        if (!fresh) {
+            return Unexpected(fresh.error());
+        }
+        enumerator = std::move(*fresh);
     }
     const auto collector = std::make_shared<ChangesCollector>();
-    (*enumerator)->enumerateChangesForObserver(collector, since);
+    enumerator->enumerateChangesForObserver(collector, since);
     auto changes = collector->wait();
-    (*enumerator)->invalidate();
+    release(container, changes ? std::optional(changes->anchor) : std::nullopt,
+            std::move(enumerator));
     return changes;
 }
 
+void LocalRequests::release(std::string_view container, const std::optional<Data>& anchor,
+                            std::unique_ptr<FileProviderEnumerator> enumerator) {
+    if (anchor && isSystemContainer(container)) {
+        kept_.keep(container, *anchor, std::move(enumerator));
+    } else {
+        enumerator->invalidate();
+    }
+}
+
+LocalRequests::Watch::Watch(LocalRequests& requests, std::vector<std::string> containers,
+                            Enumerators enumerators,
+                            std::unique_ptr<SignalHub::Subscription> subscription)
+    : requests_(requests),
+      containers_(std::move(containers)),
+      enumerators_(std::move(enumerators)),
+      subscription_(std::move(subscription)) {
+    const std::lock_guard lock(requests_.watching_);
+    for (const auto& enumerator : enumerators_) {
+        enumerator->start();
+    }
+    requests_.watches_.insert(this);
+}
+
 LocalRequests::Watch::~Watch() {
+    {
+        const std::lock_guard lock(requests_.watching_);
+        requests_.watches_.erase(this);
+    }
     for (const auto& enumerator : enumerators_) {
         enumerator->invalidate();
     }
 }
 
+void LocalRequests::Watch::renew() {
+    for (std::size_t i = 0; i < containers_.size(); ++i) {
+        if (!isSystemContainer(containers_[i])) {
+            continue;
+        }
+        // One that can't be had leaves the old one, which watches what there was.
+        if (auto fresh = requests_.enumeratorOf(containers_[i])) {
+            (*fresh)->start();
+            std::swap(enumerators_[i], *fresh);
+            (*fresh)->invalidate();
+        }
+    }
+}
+
 Expected<std::unique_ptr<LocalRequests::Watch>> LocalRequests::startWatch(
     const std::vector<std::string>& containers, SignalTaker taker) {
-    std::vector<std::unique_ptr<FileProviderEnumerator>> enumerators;
+    const std::uint64_t renewals = renewals_;
+    Watch::Enumerators enumerators;
     for (const std::string& container : containers) {
         auto enumerator = enumeratorOf(container);
         if (!enumerator) {
@@ -127,10 +190,13 @@ Expected<std::unique_ptr<LocalRequests::Watch>> LocalRequests::startWatch(
         enumerators.push_back(std::move(*enumerator));
     }
     auto subscription = services_.signals.subscribe(std::move(taker));
-    for (const auto& enumerator : enumerators) {
-        enumerator->start();
+    auto watch =
+        std::make_unique<Watch>(*this, containers, std::move(enumerators), std::move(subscription));
+    const std::lock_guard lock(watching_);
+    if (renewals != renewals_) {
+        watch->renew();
     }
-    return std::make_unique<Watch>(std::move(enumerators), std::move(subscription));
+    return watch;
 }
 
 Expected<void> LocalRequests::watch(const std::vector<std::string>& containers,
@@ -148,7 +214,73 @@ Expected<void> LocalRequests::watch(const std::vector<std::string>& containers,
 }
 
 Expected<std::vector<Finding>> LocalRequests::findings() {
+    libraries_.waitUntilKnown();
     return services_.findings();
+}
+
+Expected<std::vector<FileProviderItemPtr>> LocalRequests::appLibraries() {
+    const auto root = listing(VantrelRootContainerItemIdentifier);
+    if (!root) {
+        return Unexpected(root.error());
+    }
+    auto page = (*root)->page(VantrelInitialPageSortedByName());
+    if (!page) {
+        return Unexpected(page.error());
+    }
+    std::erase_if(page->items, [](const FileProviderItemPtr& item) {
+        return !item->itemIdentifier.starts_with(libraryPrefix);
+    });
+    return std::move(page->items);
+}
+
+Expected<FileProviderItemPtr> LocalRequests::applicationContainer(
+    std::string_view bundleIdentifier) {
+    libraries_.waitUntilKnown();
+    // Shared: the handler may still be in its last step when the answer is there.
+    const auto answer = std::make_shared<std::promise<Expected<FileProviderItemPtr>>>();
+    services_.extension._defaultApplicationContainerForBundleIdentifier(
+        bundleIdentifier,
+        [answer](Expected<FileProviderItemPtr> item) { answer->set_value(std::move(item)); });
+    return answer->get_future().get();
+}
+
+Expected<void> LocalRequests::refreshApplications() {
+    if (services_.forgetApplications) {
+        services_.forgetApplications();
+    }
+    libraries_.refreshNow();
+    return {};
+}
+
+Expected<std::vector<Thumbnail>> LocalRequests::thumbnails(
+    const std::vector<std::string>& identifiers) {
+    libraries_.waitUntilKnown();
+    std::vector<Thumbnail> thumbnails;
+    std::optional<Error> failure;
+    const FileProviderApplications::ThumbnailHandler take = [&](std::string_view identifier,
+                                                                const std::optional<Data>& data,
+                                                                const std::optional<Error>& error) {
+        thumbnails.push_back({std::string(identifier), data});
+        failure = failure ? failure : error;
+    };
+    // Sizes are the provider's to choose.
+    (void)services_.extension.fetchThumbnailsForItemIdentifiers(
+        identifiers, ThumbnailSize{}, take,
+        [&](const std::optional<Error>& error) { failure = failure ? failure : error; });
+    return failure ? Expected<std::vector<Thumbnail>>(Unexpected(*failure)) : std::move(thumbnails);
+}
+
+void LocalRequests::renewWatches() {
+    {
+        const std::lock_guard lock(watching_);
+        ++renewals_;
+        for (Watch* const watch : watches_) {
+            watch->renew();
+        }
+    }
+    // What happened in a new library before somebody watched it.
+    services_.signals.signal(VantrelRootContainerItemIdentifier);
+    services_.signals.signal(VantrelWorkingSetContainerItemIdentifier);
 }
 
 }  // namespace marrowdale::host

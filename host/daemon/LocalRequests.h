@@ -1,8 +1,14 @@
 #pragma once
 
+#include <atomic>
+#include <cstdint>
 #include <functional>
+#include <mutex>
+#include <set>
 #include <string>
 
+#include "host/daemon/AppLibraries.h"
+#include "host/daemon/KeptEnumerators.h"
 #include "host/daemon/LocalActions.h"
 #include "host/daemon/ReplicaKeeper.h"
 #include "host/daemon/SignalHub.h"
@@ -19,17 +25,18 @@ struct LocalServices {
     std::string replicaPath;  // the replica's file
     std::string stateFolder;
     std::function<std::vector<Finding>()> findings;
+    // Called before somebody's refresh, for what was remembered of applications elsewhere; may be
+    // null.
+    std::function<void()> forgetApplications = nullptr;
 };
 
 // A host's requests to the extension in its own process. Where the extension answers no value, the
-// request fails with the framework's error for an item that does not exist.
+// request fails with the framework's error for an item that does not exist. The first request waits
+// until the applications of the system are known.
 class LocalRequests final : public HostRequests {
   public:
     // Listings and watches must have ended before the services go.
-    explicit LocalRequests(LocalServices services)
-        : services_(std::move(services)),
-          actions_(services_.extension, services_.rootPath, services_.stateFolder),
-          replica_(*this, *this, services_.replicaPath) {}
+    explicit LocalRequests(LocalServices services);
 
     [[nodiscard]] Expected<FileProviderItemPtr> item(std::string_view identifier) override;
     [[nodiscard]] Expected<std::string> identifierAt(std::string_view path) override;
@@ -51,11 +58,20 @@ class LocalRequests final : public HostRequests {
     [[nodiscard]] Expected<FileProviderItemPtr> perform(const ItemAction& action,
                                                         ActionObserver& observer,
                                                         const std::stop_token& stop) override {
+        libraries_.waitUntilKnown();
         return actions_.perform(action, observer, stop);
     }
+    [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> appLibraries() override;
+    [[nodiscard]] Expected<FileProviderItemPtr> applicationContainer(
+        std::string_view bundleIdentifier) override;
+    [[nodiscard]] Expected<void> refreshApplications() override;
+    [[nodiscard]] Expected<std::vector<Thumbnail>> thumbnails(
+        const std::vector<std::string>& identifiers) override;
     [[nodiscard]] Expected<std::vector<Finding>> findings() override;
 
     [[nodiscard]] ReplicaKeeper& replica() { return replica_; }
+    // The applications of the system may have changed: has them looked at again, soon.
+    void applicationsChanged() { libraries_.ask(); }
 
     // Somebody who is told of signals, with the enumerators held for them; ends when it goes.
     class Watch;
@@ -65,23 +81,40 @@ class LocalRequests final : public HostRequests {
   private:
     [[nodiscard]] Expected<std::unique_ptr<FileProviderEnumerator>> enumeratorOf(
         std::string_view container);
+    // Keeps the enumerator for whoever comes back with that anchor; without one it has ended.
+    void release(std::string_view container, const std::optional<Data>& anchor,
+                 std::unique_ptr<FileProviderEnumerator> enumerator);
+    void renewWatches();
 
     LocalServices services_;
     LocalActions actions_;
     ReplicaKeeper replica_;
+    KeptEnumerators kept_;
+    std::mutex watching_;
+    std::set<Watch*> watches_;  // guarded by watching_
+    std::atomic<std::uint64_t> renewals_ = 0;
+    AppLibraries libraries_;  // renews watches; goes first
 };
 
 class LocalRequests::Watch {
   public:
-    Watch(std::vector<std::unique_ptr<FileProviderEnumerator>> enumerators,
-          std::unique_ptr<SignalHub::Subscription> subscription)
-        : enumerators_(std::move(enumerators)), subscription_(std::move(subscription)) {}
+    using Enumerators = std::vector<std::unique_ptr<FileProviderEnumerator>>;
+    // One enumerator for each container; they are started.
+    Watch(LocalRequests& requests, std::vector<std::string> containers, Enumerators enumerators,
+          std::unique_ptr<SignalHub::Subscription> subscription);
     Watch(const Watch&) = delete;
     Watch& operator=(const Watch&) = delete;
     ~Watch();
 
   private:
-    std::vector<std::unique_ptr<FileProviderEnumerator>> enumerators_;
+    friend class LocalRequests;
+    // The libraries are others than before: holds enumerators that watch those of now. Called with
+    // the requests' lock.
+    void renew();
+
+    LocalRequests& requests_;
+    const std::vector<std::string> containers_;
+    Enumerators enumerators_;  // guarded by the requests' lock
     std::unique_ptr<SignalHub::Subscription> subscription_;
 };
 

@@ -56,6 +56,8 @@ TEST_F(LocalRequestsTest, foldersAndContainersAreListedAndFilesAreNot) {
 TEST_F(LocalRequestsTest, theSystemsContainersAreListedWithoutALookUp) {
     FakeExtension extension;
     LocalRequests requests = requestsTo(extension);
+    ASSERT_TRUE(requests.refreshApplications().has_value());
+    extension.enumerated.clear();  // what the start looked at
     for (const auto container :
          {VantrelRootContainerItemIdentifier, VantrelWorkingSetContainerItemIdentifier,
           VantrelAllDirectoriesContainerItemIdentifier}) {

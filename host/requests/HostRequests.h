@@ -102,6 +102,30 @@ class ActionRequests {
                                                                 const std::stop_token& stop) = 0;
 };
 
+// A picture of an item, where it has one.
+struct Thumbnail {
+    std::string itemIdentifier;
+    std::optional<Data> data;  // PNG
+};
+
+class ApplicationRequests {
+  public:
+    virtual ~ApplicationRequests() = default;
+    // The document libraries of applications, as the root lists them.
+    [[nodiscard]] virtual Expected<std::vector<FileProviderItemPtr>> appLibraries() = 0;
+    // The library of one application, listed or not: invalidParameter ("bundleIdentifier") where it
+    // is not installed or has no folder that can be served.
+    [[nodiscard]] virtual Expected<FileProviderItemPtr> applicationContainer(
+        std::string_view bundleIdentifier) = 0;
+    // Has the applications of the system looked at again, and returns when it is done: what was
+    // installed before the call is known.
+    [[nodiscard]] virtual Expected<void> refreshApplications() = 0;
+    // One for each identifier, in order. Only app libraries have any; for everything else, and for
+    // what does not exist, there is none, which is no error.
+    [[nodiscard]] virtual Expected<std::vector<Thumbnail>> thumbnails(
+        const std::vector<std::string>& identifiers) = 0;
+};
+
 class ServiceRequests {
   public:
     virtual ~ServiceRequests() = default;
@@ -113,6 +137,7 @@ class HostRequests : public ItemRequests,
                      public FeedRequests,
                      public SearchRequests,
                      public ActionRequests,
+                     public ApplicationRequests,
                      public ServiceRequests {};
 
 }  // namespace marrowdale::host

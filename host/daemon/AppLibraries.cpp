@@ -1,0 +1,108 @@
+#include "host/daemon/AppLibraries.h"
+
+#include <memory>
+#include <utility>
+
+#include "host/daemon/AnchorVersions.h"
+#include "host/daemon/ChangesCollector.h"
+#include "platform/hostframework/FileProviderConstants.h"
+
+namespace marrowdale::host {
+
+namespace {
+
+// The registry may change again while the working set is brought up to it.
+constexpr int mostRounds = 5;
+
+// Tells nobody.
+void askForChanges(FileProviderEnumerator& enumerator, const Data& since) {
+    const auto collector = std::make_shared<ChangesCollector>();
+    enumerator.enumerateChangesForObserver(collector, since);
+    (void)collector->wait();
+}
+
+}  // namespace
+
+AppLibraries::AppLibraries(FileProviderExtension& extension, std::function<void()> changed)
+    : extension_(extension),
+      changed_(std::move(changed)),
+      refreshes_(extension, [this] { refreshed(); }) {}
+
+AppLibraries::~AppLibraries() {
+    refreshes_.stopTelling();
+    queue_.sync([] {});
+}
+
+void AppLibraries::waitUntilKnown() {
+    std::call_once(known_, [this] {
+        refreshes_.waitForFirst();
+        version_ = prime();
+        isKnown_ = true;
+    });
+}
+
+void AppLibraries::refreshNow() {
+    // The first refresh is not older than the extension.
+    if (!isKnown_) {
+        waitUntilKnown();
+        return;
+    }
+    refreshes_.refreshNow();
+    queue_.sync([] {});
+}
+
+void AppLibraries::refreshed() {
+    // Of the first one knows whoever waits for it.
+    if (wasRefreshed_.exchange(true)) {
+        queue_.async([this] { follow(); });
+    }
+}
+
+void AppLibraries::follow() {
+    waitUntilKnown();
+    const auto version = prime();
+    if (std::exchange(version_, version) != version && changed_) {
+        changed_();
+    }
+}
+
+std::optional<std::uint64_t> AppLibraries::prime() {
+    std::optional<std::uint64_t> newest;
+    for (int round = 0; round < mostRounds; ++round) {
+        const auto root = freshAnchor(VantrelRootContainerItemIdentifier);
+        newest = root ? libraryVersionIn(*root) : std::nullopt;
+        auto workingSet = extension_.enumeratorForContainerItemIdentifier(
+            VantrelWorkingSetContainerItemIdentifier);
+        if (!newest || !workingSet) {
+            break;
+        }
+        std::optional<Data> anchor;
+        (*workingSet)->currentSyncAnchorWithCompletionHandler([&](const auto& current) {
+            anchor = current;
+        });
+        const bool isBehind = anchor && libraryVersionIn(*anchor) != newest;
+        if (isBehind) {
+            askForChanges(**workingSet, withoutLibraryVersion(*anchor));
+        }
+        (*workingSet)->invalidate();
+        if (!isBehind) {
+            break;
+        }
+    }
+    return newest;
+}
+
+std::optional<Data> AppLibraries::freshAnchor(std::string_view container) const {
+    const auto enumerator = extension_.enumeratorForContainerItemIdentifier(container);
+    if (!enumerator) {
+        return std::nullopt;
+    }
+    std::optional<Data> anchor;
+    (*enumerator)->currentSyncAnchorWithCompletionHandler([&](const auto& current) {
+        anchor = current;
+    });
+    (*enumerator)->invalidate();
+    return anchor;
+}
+
+}  // namespace marrowdale::host
