@@ -10,6 +10,7 @@
 
 #include "host/client/HttpConnection.h"
 #include "platform/foundation/Base64.h"
+#include "tests/system/Service.h"
 #include "tests/system/SystemTest.h"
 
 namespace marrowdale::tests {
@@ -21,28 +22,6 @@ using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::UnorderedElementsAre;
-
-constexpr seconds patience{30};
-
-// `marrowdale serve` in a home, ready when this is made.
-class Service {
-  public:
-    explicit Service(const Home& home, const Arguments& arguments = {"--json", "serve"})
-        : process_(home.command(arguments)) {
-        ready_ = process_.readOutput(1, patience);
-    }
-    [[nodiscard]] const std::string& ready() const { return ready_; }
-    [[nodiscard]] pid_t number() const { return process_.number(); }
-    void kill() { process_.kill(); }
-    [[nodiscard]] ChildResult end(int signal = SIGTERM) {
-        ::kill(process_.number(), signal);
-        return process_.finish();
-    }
-
-  private:
-    ChildProcess process_;
-    std::string ready_;
-};
 
 class ServiceTest : public ::testing::Test {
   protected:
