@@ -6,12 +6,12 @@
 #include <string_view>
 #include <utility>
 
+#include "host/daemon/Applications.h"
 #include "host/daemon/Doctor.h"
 #include "host/daemon/ExtensionModule.h"
 #include "host/daemon/HostManager.h"
 #include "host/daemon/Mounts.h"
 #include "platform/Platform.h"
-#include "platform/linux/applications/NoApplications.h"
 #include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
 #include "platform/linux/files/LinuxFileSystem.h"
@@ -50,6 +50,11 @@ class World::Parts {
           manager_(options_.settings.rootPath),
           applicationSupport_(dataFolder(options_.settings)),
           deviceInformation_(options_.variable),
+          applications_({.storageRoot = options_.settings.rootPath,
+                         .cacheFolder = options_.settings.cacheFolder,
+                         .iconProgramPath = options_.iconProgramPath,
+                         .variable = options_.variable,
+                         .log = log_.get()}),
           platform_{.log = *log_,
                     .fileSystem = fileSystem_,
                     .extendedAttributes = extendedAttributes_,
@@ -57,7 +62,7 @@ class World::Parts {
                     .fileOperations = fileOperations_,
                     .generationStore = *store_,
                     .fileEvents = fileEvents_,
-                    .applications = applications_,
+                    .applications = applications_.registry(),
                     .manager = manager_,
                     .shared = shared_,
                     .applicationSupport = applicationSupport_,
@@ -66,6 +71,7 @@ class World::Parts {
                     .imageEncoder = imageEncoder_} {}
 
     ~Parts() {
+        applications_.stopWatching();
         manager_.setIndexCleaner(nullptr);
         // Handlers refer to the extension.
         fileOperations_.finish();
@@ -93,10 +99,14 @@ class World::Parts {
                           .rootPath = options_.settings.rootPath,
                           .replicaPath = options_.settings.stateFolder + "/replica.sqlite",
                           .stateFolder = options_.settings.stateFolder,
-                          .findings = [this] { return findings(); }});
+                          .findings = [this] { return findings(); },
+                          .forgetApplications = [this] { applications_.forgetIcons(); }});
         manager_.setIndexCleaner([this](std::vector<std::string> domains) {
             requests_->replica().removeDomains(std::move(domains));
         });
+        if (options_.recording == native::StoreOptions::Recording::live) {
+            applications_.watch([this] { requests_->applicationsChanged(); });
+        }
         return {};
     }
 
@@ -105,7 +115,7 @@ class World::Parts {
     [[nodiscard]] Log& log() { return *log_; }
 
   private:
-    [[nodiscard]] std::vector<Finding> findings() const {
+    [[nodiscard]] std::vector<Finding> findings() {
         const native::StoreReport report = store_->report();
         const std::string& root = options_.settings.rootPath;
         std::vector<Finding> findings =
@@ -114,6 +124,7 @@ class World::Parts {
         std::ranges::move(storeFindings(report, mountsBelow(root)), std::back_inserter(findings));
         std::ranges::move(historyFindings(report, options_.retention),
                           std::back_inserter(findings));
+        std::ranges::move(applications_.findings(), std::back_inserter(findings));
         return findings;
     }
 
@@ -145,8 +156,7 @@ class World::Parts {
     native::LinuxDeviceInformation deviceInformation_;
     native::LinuxIconService icons_;
     native::PNGEncoder imageEncoder_;
-    // The store records one tree; applications come when it records theirs beside it.
-    native::NoApplications applications_;
+    Applications applications_;
     // Holds objects of the extension's, whose code is in the module.
     SharedObjects shared_;
     Platform platform_;
