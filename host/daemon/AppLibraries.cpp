@@ -23,9 +23,11 @@ void askForChanges(FileProviderEnumerator& enumerator, const Data& since) {
 
 }  // namespace
 
-AppLibraries::AppLibraries(FileProviderExtension& extension, std::function<void()> changed)
+AppLibraries::AppLibraries(FileProviderExtension& extension, std::function<void()> changed,
+                           std::function<void()> known)
     : extension_(extension),
       changed_(std::move(changed)),
+      knownTo_(std::move(known)),
       refreshes_(extension, [this] { refreshed(); }) {}
 
 AppLibraries::~AppLibraries() {
@@ -36,7 +38,7 @@ AppLibraries::~AppLibraries() {
 void AppLibraries::waitUntilKnown() {
     std::call_once(known_, [this] {
         refreshes_.waitForFirst();
-        version_ = prime();
+        bringUp();
         isKnown_ = true;
     });
 }
@@ -60,9 +62,17 @@ void AppLibraries::refreshed() {
 
 void AppLibraries::follow() {
     waitUntilKnown();
-    const auto version = prime();
-    if (std::exchange(version_, version) != version && changed_) {
+    const auto before = version_;
+    bringUp();
+    if (before != version_ && changed_) {
         changed_();
+    }
+}
+
+void AppLibraries::bringUp() {
+    version_ = prime();
+    if (knownTo_) {
+        knownTo_();
     }
 }
 

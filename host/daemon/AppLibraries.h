@@ -18,10 +18,12 @@ namespace marrowdale::host {
 // up to what was found, then and after every later refresh. Any thread; outlives no extension.
 class AppLibraries {
   public:
-    // `changed` (may be null) is called on a queue of its own when a later refresh brought another
-    // version of the libraries; never after this object is gone.
-    explicit AppLibraries(FileProviderExtension& extension,
-                          std::function<void()> changed = nullptr);
+    // `known` (may be null) is called after the first and after every later refresh, once the
+    // working set knows of it, by whoever waits for that; `changed` (may be null) after it, on a
+    // queue of its own, when a later refresh brought another version of the libraries. Neither is
+    // called after this object is gone.
+    explicit AppLibraries(FileProviderExtension& extension, std::function<void()> changed = nullptr,
+                          std::function<void()> known = nullptr);
 
     ~AppLibraries();
     AppLibraries(const AppLibraries&) = delete;
@@ -39,6 +41,7 @@ class AppLibraries {
   private:
     void refreshed();
     void follow();
+    void bringUp();
     // Has the working set brought up to the newest version, which is answered; none where anchors
     // tell of no version.
     std::optional<std::uint64_t> prime();
@@ -46,6 +49,7 @@ class AppLibraries {
 
     FileProviderExtension& extension_;
     const std::function<void()> changed_;
+    const std::function<void()> knownTo_;
     std::atomic<bool> wasRefreshed_ = false;
     std::once_flag known_;
     std::atomic<bool> isKnown_ = false;

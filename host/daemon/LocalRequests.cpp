@@ -49,7 +49,7 @@ LocalRequests::LocalRequests(LocalServices services)
     : services_(std::move(services)),
       actions_(services_.extension, services_.rootPath, services_.stateFolder),
       replica_(*this, *this, services_.replicaPath),
-      libraries_(services_.extension, [this] { renewWatches(); }) {}
+      libraries_(services_.extension, [this] { renewWatches(); }, services_.librariesAreKnown) {}
 
 Expected<FileProviderItemPtr> LocalRequests::item(std::string_view identifier) {
     libraries_.waitUntilKnown();

@@ -28,6 +28,9 @@ struct LocalServices {
     // Called before somebody's refresh, for what was remembered of applications elsewhere; may be
     // null.
     std::function<void()> forgetApplications = nullptr;
+    // Called once the extension knows which app libraries there are, and after every later refresh;
+    // may be null.
+    std::function<void()> librariesAreKnown = nullptr;
 };
 
 // A host's requests to the extension in its own process. Where the extension answers no value, the

@@ -10,6 +10,8 @@
 #include "host/daemon/Doctor.h"
 #include "host/daemon/ExtensionModule.h"
 #include "host/daemon/HostManager.h"
+#include "host/daemon/LibraryWitness.h"
+#include "host/daemon/MarkedFileEvents.h"
 #include "host/daemon/Mounts.h"
 #include "platform/Platform.h"
 #include "platform/linux/files/LinuxApplicationSupport.h"
@@ -35,6 +37,7 @@ class World::Parts {
           store_(std::move(store)),
           temporaries_(std::move(temporaries)),
           fileEvents_(*store_, log_.get()),
+          libraryWitness_(options_.settings.stateFolder, dataFolder(options_.settings), log_.get()),
           trees_({options_.settings.rootPath},
                  {options_.settings.stateFolder, options_.settings.cacheFolder}),
           fileSystem_({.documents = *store_,
@@ -61,7 +64,7 @@ class World::Parts {
                     .writeAccess = writeAccess_,
                     .fileOperations = fileOperations_,
                     .generationStore = *store_,
-                    .fileEvents = fileEvents_,
+                    .fileEvents = markedFileEvents_,
                     .applications = applications_.registry(),
                     .manager = manager_,
                     .shared = shared_,
@@ -100,7 +103,8 @@ class World::Parts {
                           .replicaPath = options_.settings.stateFolder + "/replica.sqlite",
                           .stateFolder = options_.settings.stateFolder,
                           .findings = [this] { return findings(); },
-                          .forgetApplications = [this] { applications_.forgetIcons(); }});
+                          .forgetApplications = [this] { applications_.forgetIcons(); },
+                          .librariesAreKnown = [this] { libraryWitness_.lookAgain(); }});
         manager_.setIndexCleaner([this](std::vector<std::string> domains) {
             requests_->replica().removeDomains(std::move(domains));
         });
@@ -141,6 +145,8 @@ class World::Parts {
     std::unique_ptr<native::Store> store_;
     std::unique_ptr<native::Temporaries> temporaries_;
     native::LinuxFileEvents fileEvents_;
+    LibraryWitness libraryWitness_;
+    MarkedFileEvents markedFileEvents_{fileEvents_, libraryWitness_};
     native::ServedTrees trees_;  // after the store, which makes the folders that are kept out
     native::MimeTypes types_;
     native::PackageTypes packages_;

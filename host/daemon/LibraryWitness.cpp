@@ -1,0 +1,152 @@
+#include "host/daemon/LibraryWitness.h"
+
+#include <cstddef>
+#include <unistd.h>
+
+#include "platform/foundation/KeyedArchive.h"
+#include "platform/foundation/PropertyList.h"
+#include "platform/linux/store/CRC32C.h"
+
+namespace marrowdale::host {
+
+namespace {
+
+constexpr const char* witnessName = "app-libraries.witness";
+// The extension's own files and the one key in them that matters here.
+constexpr const char* mainListName = "Marrowdale/app-libraries.plist";
+constexpr const char* workingSetListName = "Marrowdale/searchable-app-libraries.plist";
+constexpr std::string_view versionKey = "versionToken";
+
+constexpr const char* markField = "mark";
+constexpr const char* versionField = "version";
+constexpr const char* sizeField = "size";
+constexpr const char* checksumField = "checksum";
+
+URL in(const std::string& folder, const char* name) {
+    return URL::fileURL(folder + "/" + name);
+}
+
+std::uint64_t versionIn(const Data& list) {
+    const auto archived = unarchive(list.bytes());
+    const auto* fields = archived ? archived->as<ArchivedDictionary>() : nullptr;
+    const auto field = fields ? fields->find(versionKey) : ArchivedDictionary::const_iterator();
+    const auto* number = fields && field != fields->end() ? field->second.as<Number>() : nullptr;
+    if (number == nullptr) {
+        return 0;
+    }
+    const auto* positive = std::get_if<std::uint64_t>(number);
+    const auto* other = std::get_if<std::int64_t>(number);
+    return positive ? *positive : other && *other > 0 ? static_cast<std::uint64_t>(*other) : 0;
+}
+
+std::optional<std::uint64_t> numberIn(const PropertyListDictionary& fields, const char* name) {
+    const auto field = fields.find(name);
+    return field == fields.end() ? std::nullopt : field->second.asUnsigned();
+}
+
+std::optional<UUID> markIn(const PropertyListDictionary& fields) {
+    const auto field = fields.find(markField);
+    const auto* text = field == fields.end() ? nullptr : field->second.as<std::string>();
+    return text ? UUID::fromText(*text) : std::nullopt;
+}
+
+}  // namespace
+
+bool LibraryWitness::Seen::goesOnFrom(const Seen& earlier) const {
+    return earlier.version == 0 || version > earlier.version || *this == earlier;
+}
+
+LibraryWitness::LibraryWitness(const std::string& stateFolder, const std::string& dataHome,
+                               Log* log)
+    : log_(log),
+      state_(stateFolder),
+      lists_(dataHome),
+      witnessURL_(in(stateFolder, witnessName)),
+      mainListURL_(in(dataHome, mainListName)),
+      workingSetListURL_(in(dataHome, workingSetListName)) {
+    const bool isKnown = readWitness();
+    const Seen now = look();
+    if (isKnown && now.goesOnFrom(seen_)) {
+        return;
+    }
+    if (isKnown) {
+        if (log_) {
+            log_->error("the list of app libraries is not the one that it was; it is made anew");
+        }
+        // What can't be removed is looked at by the extension, and again by the next start.
+        ::unlink(mainListURL_.path().c_str());
+        ::unlink(workingSetListURL_.path().c_str());
+    }
+    mark_ = UUID::random();
+    seen_ = {};
+    write();
+}
+
+UUID LibraryWitness::marked(const UUID& history) const {
+    const std::lock_guard lock(mutex_);
+    UUID result = history;
+    for (std::size_t i = 0; i < result.bytes.size(); ++i) {
+        result.bytes.at(i) ^= mark_.bytes.at(i);
+    }
+    return result;
+}
+
+void LibraryWitness::lookAgain() {
+    const std::lock_guard lock(mutex_);
+    const Seen now = look();
+    if (now == seen_) {
+        return;
+    }
+    if (!now.goesOnFrom(seen_)) {
+        mark_ = UUID::random();
+        if (!isLost_) {
+            isLost_ = true;
+            write();
+        }
+    }
+    seen_ = now;
+    if (!isLost_) {
+        write();
+    }
+}
+
+LibraryWitness::Seen LibraryWitness::look() {
+    const auto list = lists_.read(mainListURL_);
+    if (!list) {
+        return {};
+    }
+    const Seen seen{.version = versionIn(*list),
+                    .size = list->size(),
+                    .checksum = native::crc32c(std::as_bytes(list->bytes()))};
+    return seen.version == 0 ? Seen() : seen;
+}
+
+bool LibraryWitness::readWitness() {
+    const auto file = state_.read(witnessURL_);
+    const auto list = file ? decodePropertyList(file->bytes()) : Unexpected(file.error());
+    const auto* fields = list ? list->as<PropertyListDictionary>() : nullptr;
+    const auto mark = fields ? markIn(*fields) : std::nullopt;
+    const auto version = fields ? numberIn(*fields, versionField) : std::nullopt;
+    const auto size = fields ? numberIn(*fields, sizeField) : std::nullopt;
+    const auto checksum = fields ? numberIn(*fields, checksumField) : std::nullopt;
+    if (!mark || !version || !size || !checksum) {
+        return false;
+    }
+    mark_ = *mark;
+    seen_ = {.version = *version, .size = *size, .checksum = *checksum};
+    return true;
+}
+
+void LibraryWitness::write() {
+    const auto file = encodePropertyList(
+        PropertyList(PropertyListDictionary{{markField, PropertyList(mark_.text())},
+                                            {versionField, PropertyList(seen_.version)},
+                                            {sizeField, PropertyList(seen_.size)},
+                                            {checksumField, PropertyList(seen_.checksum)}}));
+    const auto written = file ? state_.replace(witnessURL_, *file) : Unexpected(file.error());
+    if (!written && log_) {
+        log_->error("can't remember the list of app libraries; " + written.error().description());
+    }
+}
+
+}  // namespace marrowdale::host
