@@ -44,6 +44,7 @@ void compareMemory(Suite& suite);
 void compareRecording(Suite& suite);
 void compareReplays(Suite& suite);
 void compareStoreSize(Suite& suite);
+void compareApplications(Suite& suite);
 void compareWatchman(Suite& suite);
 
 enum class MemoryOf { index, listing, recording };

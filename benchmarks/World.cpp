@@ -50,7 +50,7 @@ class Manager : public FileProviderManager {
 class PageKeeper : public FileProviderEnumerationObserver {
   public:
     void didEnumerateItems(std::vector<FileProviderItemPtr> items) override {
-        items_ = std::move(items);
+        items_.insert(items_.end(), items.begin(), items.end());
     }
     void finishEnumeratingUpToPage(std::optional<Data> nextPage) override {
         nextPage_ = std::move(nextPage);
@@ -99,13 +99,16 @@ std::unique_ptr<native::Temporaries> openedTemporaries(const std::string& state)
 
 class World::Parts {
   public:
-    Parts(const std::string& root, const std::string& state)
-        : store(openedStore(root, state)),
+    Parts(const std::string& root, const std::string& state, ApplicationRegistry* registry)
+        : applications(registry ? *registry : noApplications),
+          store(openedStore(root, state)),
           trees({root}, {state, state + "/cache"}),
           temporaries(openedTemporaries(state)),
           manager(URL::fileURL(root)),
           applicationSupport(state + "/data") {}
 
+    native::NoApplications noApplications;
+    ApplicationRegistry& applications;
     std::unique_ptr<native::Store> store;
     native::LinuxFileEvents fileEvents{*store};
     native::ServedTrees trees;
@@ -126,7 +129,6 @@ class World::Parts {
     native::LinuxWriteAccess writeAccess{trees};
     std::unique_ptr<native::Temporaries> temporaries;
     native::LinuxFileOperations fileOperations{{trees, packages, *temporaries}, &log};
-    native::NoApplications applications;
     Manager manager;
     SharedObjects shared;
     native::LinuxApplicationSupport applicationSupport;
@@ -151,7 +153,9 @@ class World::Parts {
 };
 
 World::World(const std::string& root, const std::string& state)
-    : parts_(std::make_unique<Parts>(root, state)) {}
+    : parts_(std::make_unique<Parts>(root, state, nullptr)) {}
+World::World(const std::string& root, const std::string& state, ApplicationRegistry& applications)
+    : parts_(std::make_unique<Parts>(root, state, &applications)) {}
 World::~World() = default;
 
 native::Store& World::store() {

@@ -20,6 +20,8 @@ class World {
   public:
     // Reconciles the store, as every start does.
     World(const std::string& root, const std::string& state);
+    // On a system with these applications, which outlive it.
+    World(const std::string& root, const std::string& state, ApplicationRegistry& applications);
     ~World();
     World(const World&) = delete;
     World& operator=(const World&) = delete;

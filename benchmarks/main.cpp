@@ -29,10 +29,15 @@ int run(const std::vector<std::string>& arguments) {
                 .sizes = quick ? Sizes::quick() : Sizes::full(),
                 .table = Table(quick ? Table::Targets::leftOut : Table::Targets::shown)};
     const std::vector<std::pair<const char*, void (*)(Suite&)>> parts{
-        {"listings", compareListings}, {"paging", comparePaging},
-        {"look-ups", compareLookUps},  {"reconcile", compareReconcile},
-        {"memory", compareMemory},     {"recording", compareRecording},
-        {"replays", compareReplays},   {"the store's size", compareStoreSize},
+        {"listings", compareListings},
+        {"paging", comparePaging},
+        {"look-ups", compareLookUps},
+        {"reconcile", compareReconcile},
+        {"memory", compareMemory},
+        {"recording", compareRecording},
+        {"replays", compareReplays},
+        {"the store's size", compareStoreSize},
+        {"applications", compareApplications},
         {"watchman", compareWatchman}};
     for (const auto& [name, compare] : parts) {
         std::cerr << "measuring " << name << '\n';
