@@ -2,9 +2,11 @@
 
 #include <filesystem>
 #include <sys/stat.h>
+#include <tuple>
 
 #include <gmock/gmock.h>
 
+#include "host/client/HttpConnection.h"
 #include "tests/system/ApplicationHome.h"
 #include "tests/system/Service.h"
 
@@ -224,6 +226,31 @@ TEST_F(ApplicationsTest, commandsAnswerThroughAServiceAsTheyDoWithoutIt) {
                 EXPECT_EQ(with.errors, without[i].errors);
             }
         }
+    }
+}
+
+TEST_F(ApplicationsTest, programsAskForPicturesAndRefreshesOverTheSocket) {
+    home_.install(notes, "Notes");
+    const Service service(home_);
+    auto connection = host::HttpConnection::open(home_.path(".local/state/marrowdale"));
+    ASSERT_TRUE(connection.has_value());
+    const auto ask = [&](const std::string& method, const std::string& target) {
+        return (*connection)->send({.method = method, .target = target}).value();
+    };
+    const auto picture = ask("GET", "/v1/items/%23" + notes + "/thumbnail");
+    EXPECT_EQ(picture.status, 200U);
+    const std::string path =
+        home_.line({"thumbnail", "#" + notes, "--out", home_.path("out")}).at("path");
+    EXPECT_EQ(picture.body, readFile(path));
+    const auto none = ask("GET", "/v1/items/root/thumbnail");
+    EXPECT_EQ(none.status, 204U);
+    EXPECT_EQ(none.body, "");
+    EXPECT_EQ(ask("POST", "/v1/refresh").body, "{}");
+    for (const auto& [method, target, status] :
+         {std::tuple("GET", "/v1/refresh", 405U), std::tuple("POST", "/v1/apps", 405U),
+          std::tuple("GET", "/v1/apps/none", 400U), std::tuple("GET", "/v1/apps/a/b", 404U),
+          std::tuple("POST", "/v1/refresh/x", 405U)}) {
+        EXPECT_EQ(ask(method, target).status, status) << method << target;
     }
 }
 
