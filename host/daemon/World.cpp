@@ -13,6 +13,7 @@
 #include "host/daemon/LibraryWitness.h"
 #include "host/daemon/MarkedFileEvents.h"
 #include "host/daemon/Mounts.h"
+#include "host/daemon/ServedLibraries.h"
 #include "platform/Platform.h"
 #include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
@@ -27,18 +28,41 @@
 
 namespace marrowdale::host {
 
+// The applications, and what sees to it that their documents are recorded and served. Made before
+// the store, which is opened with the folders that are there.
+struct World::ApplicationSide {
+    ApplicationSide(const WorldOptions& options, Log& log)
+        : libraries(options.settings.rootPath),
+          applications(
+              {.storageRoot = options.settings.rootPath,
+               .cacheFolder = options.settings.cacheFolder,
+               .iconProgramPath = options.iconProgramPath,
+               .variable = options.variable,
+               .log = &log,
+               .documentFoldersChanged =
+                   [this](const std::vector<std::string>& paths) { libraries.set(paths); }}),
+          foldersAtStart(applications.registry().documentFolders()) {}
+
+    ServedLibraries libraries;
+    Applications applications;
+    const std::vector<std::string> foldersAtStart;
+};
+
 // Members in the order in which they need each other; they go in the reverse order.
 class World::Parts {
   public:
-    Parts(WorldOptions options, std::unique_ptr<Log> log, std::unique_ptr<native::Store> store,
+    Parts(WorldOptions options, std::unique_ptr<Log> log,
+          std::unique_ptr<ApplicationSide> applicationSide, std::unique_ptr<native::Store> store,
           std::unique_ptr<native::Temporaries> temporaries)
         : options_(std::move(options)),
           log_(std::move(log)),
+          applicationSide_(std::move(applicationSide)),
+          applications_(applicationSide_->applications),
           store_(std::move(store)),
           temporaries_(std::move(temporaries)),
           fileEvents_(*store_, log_.get()),
           libraryWitness_(options_.settings.stateFolder, dataFolder(options_.settings), log_.get()),
-          trees_({options_.settings.rootPath},
+          trees_(applicationSide_->libraries.rootsWith(applicationSide_->foldersAtStart),
                  {options_.settings.stateFolder, options_.settings.cacheFolder}),
           fileSystem_({.documents = *store_,
                        .types = types_,
@@ -53,11 +77,6 @@ class World::Parts {
           manager_(options_.settings.rootPath),
           applicationSupport_(dataFolder(options_.settings)),
           deviceInformation_(options_.variable),
-          applications_({.storageRoot = options_.settings.rootPath,
-                         .cacheFolder = options_.settings.cacheFolder,
-                         .iconProgramPath = options_.iconProgramPath,
-                         .variable = options_.variable,
-                         .log = log_.get()}),
           platform_{.log = *log_,
                     .fileSystem = fileSystem_,
                     .extendedAttributes = extendedAttributes_,
@@ -71,7 +90,10 @@ class World::Parts {
                     .applicationSupport = applicationSupport_,
                     .deviceInformation = deviceInformation_,
                     .icons = icons_,
-                    .imageEncoder = imageEncoder_} {}
+                    .imageEncoder = imageEncoder_} {
+        applicationSide_->libraries.attach(*store_, trees_, applicationSide_->foldersAtStart,
+                                           *log_);
+    }
 
     ~Parts() {
         applications_.stopWatching();
@@ -125,7 +147,11 @@ class World::Parts {
         std::vector<Finding> findings =
             listeningFindings(report.recorder.isLive ? report.recorder : triedRecorder(root),
                               report.reconcile.folders);
-        std::ranges::move(storeFindings(report, mountsBelow(root)), std::back_inserter(findings));
+        std::vector<std::string> mounts = mountsBelow(root);
+        for (const auto& library : report.libraries) {
+            std::ranges::move(mountsBelow(library.path), std::back_inserter(mounts));
+        }
+        std::ranges::move(storeFindings(report, mounts), std::back_inserter(findings));
         std::ranges::move(historyFindings(report, options_.retention),
                           std::back_inserter(findings));
         std::ranges::move(applications_.findings(), std::back_inserter(findings));
@@ -142,6 +168,8 @@ class World::Parts {
     // that takes its code.
     std::unique_ptr<ExtensionModule> module_;
     std::unique_ptr<Log> log_;
+    std::unique_ptr<ApplicationSide> applicationSide_;
+    Applications& applications_;
     std::unique_ptr<native::Store> store_;
     std::unique_ptr<native::Temporaries> temporaries_;
     native::LinuxFileEvents fileEvents_;
@@ -162,7 +190,6 @@ class World::Parts {
     native::LinuxDeviceInformation deviceInformation_;
     native::LinuxIconService icons_;
     native::PNGEncoder imageEncoder_;
-    Applications applications_;
     // Holds objects of the extension's, whose code is in the module.
     SharedObjects shared_;
     Platform platform_;
@@ -190,10 +217,13 @@ std::string holder(const Error& error) {
     return digits.empty() ? "another process" : std::string(words) + std::string(digits);
 }
 
-Expected<std::unique_ptr<native::Store>> openStore(const WorldOptions& options, Log& log) {
+Expected<std::unique_ptr<native::Store>> openStore(const WorldOptions& options,
+                                                   std::vector<native::LibraryFolder> libraries,
+                                                   Log& log) {
     native::StoreOptions store{.stateFolder = options.settings.stateFolder,
                                .cacheFolder = options.settings.cacheFolder,
                                .rootPath = options.settings.rootPath,
+                               .libraries = std::move(libraries),
                                .lockWait = std::min(options.quietWait, options.lockWait),
                                .isServed = options.isServed,
                                .log = &log,
@@ -224,7 +254,9 @@ StartFailure openingFailed(Error error, const Settings& settings) {
 
 Started<std::unique_ptr<World>> World::open(const WorldOptions& options) {
     auto log = std::make_unique<Log>(options.logSink, options.logThreshold);
-    auto store = openStore(options, *log);
+    auto applicationSide = std::make_unique<ApplicationSide>(options, *log);
+    auto store =
+        openStore(options, ServedLibraries::foldersAt(applicationSide->foldersAtStart), *log);
     if (!store) {
         return std::unexpected(openingFailed(std::move(store.error()), options.settings));
     }
@@ -235,8 +267,8 @@ Started<std::unique_ptr<World>> World::open(const WorldOptions& options) {
     (*temporaries)->sweep([&](FileID folder) {
         return (*store)->pathForFileID((*store)->device(), folder);
     });
-    auto parts = std::make_unique<Parts>(options, std::move(log), std::move(*store),
-                                         std::move(*temporaries));
+    auto parts = std::make_unique<Parts>(options, std::move(log), std::move(applicationSide),
+                                         std::move(*store), std::move(*temporaries));
     if (auto loaded = parts->loadExtension(); !loaded) {
         return std::unexpected(std::move(loaded.error()));
     }

@@ -65,6 +65,7 @@ class World {
     [[nodiscard]] Log& log() const;
 
   private:
+    struct ApplicationSide;
     class Parts;
     explicit World(std::unique_ptr<Parts> parts);
     std::unique_ptr<Parts> parts_;
