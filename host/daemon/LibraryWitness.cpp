@@ -4,7 +4,6 @@
 #include <unistd.h>
 
 #include "platform/foundation/KeyedArchive.h"
-#include "platform/foundation/PropertyList.h"
 #include "platform/linux/store/CRC32C.h"
 
 namespace marrowdale::host {
@@ -19,6 +18,7 @@ constexpr std::string_view versionKey = "versionToken";
 
 constexpr const char* markField = "mark";
 constexpr const char* versionField = "version";
+constexpr const char* packagesField = "packageExtensions";
 constexpr const char* sizeField = "size";
 constexpr const char* checksumField = "checksum";
 
@@ -57,19 +57,21 @@ bool LibraryWitness::Seen::goesOnFrom(const Seen& earlier) const {
 }
 
 LibraryWitness::LibraryWitness(const std::string& stateFolder, const std::string& dataHome,
-                               Log* log)
+                               const std::vector<std::string>& packageExtensions, Log* log)
     : log_(log),
       state_(stateFolder),
       lists_(dataHome),
+      packages_(PropertyListArray(packageExtensions.begin(), packageExtensions.end())),
       witnessURL_(in(stateFolder, witnessName)),
       mainListURL_(in(dataHome, mainListName)),
       workingSetListURL_(in(dataHome, workingSetListName)) {
     const bool isKnown = readWitness();
     const Seen now = look();
-    if (isKnown && now.goesOnFrom(seen_)) {
+    const bool goesOn = isKnown && now.goesOnFrom(seen_);
+    if (goesOn && arePackagesKnown_) {
         return;
     }
-    if (isKnown) {
+    if (isKnown && !goesOn) {
         if (log_) {
             log_->error("the list of app libraries is not the one that it was; it is made anew");
         }
@@ -78,7 +80,7 @@ LibraryWitness::LibraryWitness(const std::string& stateFolder, const std::string
         ::unlink(workingSetListURL_.path().c_str());
     }
     mark_ = UUID::random();
-    seen_ = {};
+    seen_ = goesOn ? seen_ : Seen();
     write();
 }
 
@@ -132,6 +134,8 @@ bool LibraryWitness::readWitness() {
     if (!mark || !version || !size || !checksum) {
         return false;
     }
+    const auto packages = fields->find(packagesField);
+    arePackagesKnown_ = packages != fields->end() && packages->second == packages_;
     mark_ = *mark;
     seen_ = {.version = *version, .size = *size, .checksum = *checksum};
     return true;
@@ -141,6 +145,7 @@ void LibraryWitness::write() {
     const auto file = encodePropertyList(
         PropertyList(PropertyListDictionary{{markField, PropertyList(mark_.text())},
                                             {versionField, PropertyList(seen_.version)},
+                                            {packagesField, packages_},
                                             {sizeField, PropertyList(seen_.size)},
                                             {checksumField, PropertyList(seen_.checksum)}}));
     const auto written = file ? state_.replace(witnessURL_, *file) : Unexpected(file.error());

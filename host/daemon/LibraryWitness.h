@@ -4,8 +4,10 @@
 #include <mutex>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "platform/foundation/Log.h"
+#include "platform/foundation/PropertyList.h"
 #include "platform/foundation/UUID.h"
 #include "platform/linux/files/LinuxApplicationSupport.h"
 
@@ -16,14 +18,19 @@ namespace marrowdale::host {
 // then stand for another list than its holder was told of. So the history gets another UUID, which
 // every anchor carries, and all of them are expired.
 //
+// So it is when applications declare other packages than before: what was a folder is one document
+// then, or the other way round, and nothing else tells of that.
+//
 // What the list was when it was last seen is kept in the state folder; when that is lost, the UUID
 // is another one as well. Any thread.
 class LibraryWitness {
   public:
     // Looks at the list, before the extension does. One that does not go on from what was seen is
     // removed, and so is what the working set knew of it, which could not be told from what is to
-    // come. `dataHome`: where the extension keeps its lists. The log may be null.
-    LibraryWitness(const std::string& stateFolder, const std::string& dataHome, Log* log);
+    // come. `dataHome`: where the extension keeps its lists; `packageExtensions`: those that count
+    // in this run. The log may be null.
+    LibraryWitness(const std::string& stateFolder, const std::string& dataHome,
+                   const std::vector<std::string>& packageExtensions, Log* log);
 
     // The UUID that a history has for holders of anchors.
     [[nodiscard]] UUID marked(const UUID& history) const;
@@ -48,12 +55,14 @@ class LibraryWitness {
     Log* const log_;
     native::LinuxApplicationSupport state_;
     native::LinuxApplicationSupport lists_;
+    const PropertyList packages_;
     const URL witnessURL_;
     const URL mainListURL_;
     const URL workingSetListURL_;
     mutable std::mutex mutex_;
-    UUID mark_;            // guarded by mutex_
-    Seen seen_;            // guarded by mutex_
+    bool arePackagesKnown_ = false;  // whether they were the same when the list was last seen
+    UUID mark_;                      // guarded by mutex_
+    Seen seen_;                      // guarded by mutex_
     bool isLost_ = false;  // in this run; what is on disk stays as it was, for the next. By mutex_
 };
 

@@ -30,13 +30,16 @@ class LibraryWitnessTest : public ::testing::Test {
                                                      {"bundleProxy", content}})
                               ->text());
     }
-    LibraryWitness open() { return {folder_.path("state"), folder_.path("data"), &log_}; }
+    LibraryWitness open() {
+        return {folder_.path("state"), folder_.path("data"), packages_, &log_};
+    }
     // What a run of the program leaves.
     UUID run() {
-        LibraryWitness witness(folder_.path("state"), folder_.path("data"), &log_);
+        LibraryWitness witness(folder_.path("state"), folder_.path("data"), packages_, &log_);
         witness.lookAgain();
         return witness.marked({});
     }
+    std::vector<std::string> packages_;
     TemporaryDirectory folder_;
     std::shared_ptr<RecordingLogSink> sink_ = std::make_shared<RecordingLogSink>();
     Log log_{sink_, LogLevel::debug};
@@ -87,7 +90,7 @@ TEST_F(LibraryWitnessTest, aListThatIsLostWhileItIsWatchedChangesTheMarkOnceAndI
     const UUID before = run();
     UUID after;
     {
-        LibraryWitness witness(folder_.path("state"), folder_.path("data"), &log_);
+        LibraryWitness witness(folder_.path("state"), folder_.path("data"), packages_, &log_);
         writeList(1);
         witness.lookAgain();
         after = witness.marked({});
@@ -109,6 +112,18 @@ TEST_F(LibraryWitnessTest, withoutWhatWasSeenTheMarkIsAnotherAndTheListStays) {
         EXPECT_NE(other, mark);
         EXPECT_EQ(run(), other);
     }
+    EXPECT_TRUE(fs::exists(list()));
+}
+
+TEST_F(LibraryWitnessTest, otherPackagesThanBeforeChangeTheMarkAndNotTheList) {
+    writeList(5);
+    const UUID none = run();
+    packages_ = {"note"};
+    const UUID one = run();
+    EXPECT_NE(one, none);
+    EXPECT_EQ(run(), one);
+    packages_ = {"note", "sketch"};
+    EXPECT_NE(run(), one);
     EXPECT_TRUE(fs::exists(list()));
 }
 

@@ -41,11 +41,16 @@ struct World::ApplicationSide {
                .log = &log,
                .documentFoldersChanged =
                    [this](const std::vector<std::string>& paths) { libraries.set(paths); }}),
-          foldersAtStart(applications.registry().documentFolders()) {}
+          foldersAtStart(applications.registry().documentFolders()),
+          packageExtensions(applications.registry().packageExtensions()),
+          packages(packageExtensions) {}
 
     ServedLibraries libraries;
     Applications applications;
     const std::vector<std::string> foldersAtStart;
+    // As applications had it at the start: what is a folder and what a document stays for a run.
+    const std::vector<std::string> packageExtensions;
+    const native::PackageTypes packages;
 };
 
 // Members in the order in which they need each other; they go in the reverse order.
@@ -61,19 +66,20 @@ class World::Parts {
           store_(std::move(store)),
           temporaries_(std::move(temporaries)),
           fileEvents_(*store_, log_.get()),
-          libraryWitness_(options_.settings.stateFolder, dataFolder(options_.settings), log_.get()),
+          libraryWitness_(options_.settings.stateFolder, dataFolder(options_.settings),
+                          applicationSide_->packageExtensions, log_.get()),
           trees_(applicationSide_->libraries.rootsWith(applicationSide_->foldersAtStart),
                  {options_.settings.stateFolder, options_.settings.cacheFolder}),
           fileSystem_({.documents = *store_,
                        .types = types_,
-                       .packages = packages_,
+                       .packages = applicationSide_->packages,
                        .attributes = attributeCache_,
                        .calls = attributeCalls_,
                        .trees = trees_,
                        .work = sharedWork_}),
           extendedAttributes_(attributeCalls_, trees_),
           writeAccess_(trees_),
-          fileOperations_({trees_, packages_, *temporaries_}, log_.get()),
+          fileOperations_({trees_, applicationSide_->packages, *temporaries_}, log_.get()),
           manager_(options_.settings.rootPath),
           applicationSupport_(dataFolder(options_.settings)),
           deviceInformation_(options_.variable),
@@ -177,7 +183,6 @@ class World::Parts {
     MarkedFileEvents markedFileEvents_{fileEvents_, libraryWitness_};
     native::ServedTrees trees_;  // after the store, which makes the folders that are kept out
     native::MimeTypes types_;
-    native::PackageTypes packages_;
     native::AttributeCache attributeCache_;
     native::AttributeCalls attributeCalls_;
     native::SharedWork sharedWork_;
@@ -219,7 +224,7 @@ std::string holder(const Error& error) {
 
 Expected<std::unique_ptr<native::Store>> openStore(const WorldOptions& options,
                                                    std::vector<native::LibraryFolder> libraries,
-                                                   Log& log) {
+                                                   const native::PackageTypes& packages, Log& log) {
     native::StoreOptions store{.stateFolder = options.settings.stateFolder,
                                .cacheFolder = options.settings.cacheFolder,
                                .rootPath = options.settings.rootPath,
@@ -228,6 +233,7 @@ Expected<std::unique_ptr<native::Store>> openStore(const WorldOptions& options,
                                .isServed = options.isServed,
                                .log = &log,
                                .recording = options.recording,
+                               .packages = &packages,
                                .retention = options.retention};
     auto opened = native::Store::open(store);
     if (opened || !isHeldByAnother(opened.error()) || options.quietWait >= options.lockWait) {
@@ -255,8 +261,8 @@ StartFailure openingFailed(Error error, const Settings& settings) {
 Started<std::unique_ptr<World>> World::open(const WorldOptions& options) {
     auto log = std::make_unique<Log>(options.logSink, options.logThreshold);
     auto applicationSide = std::make_unique<ApplicationSide>(options, *log);
-    auto store =
-        openStore(options, ServedLibraries::foldersAt(applicationSide->foldersAtStart), *log);
+    auto store = openStore(options, ServedLibraries::foldersAt(applicationSide->foldersAtStart),
+                           applicationSide->packages, *log);
     if (!store) {
         return std::unexpected(openingFailed(std::move(store.error()), options.settings));
     }

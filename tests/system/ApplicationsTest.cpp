@@ -159,6 +159,19 @@ TEST_F(ApplicationsTest, anUnreadableFolderIsLeftOutAndDoctorSaysSo) {
     ASSERT_EQ(::chmod(home_.library(notes).c_str(), 0700), 0);
 }
 
+TEST_F(ApplicationsTest, whatApplicationsSayArePackagesAreDocuments) {
+    makeFolder(home_.document("plan.sketch/inside"));
+    const std::string anchor = text(home_.line({"anchor", "root"}), "anchor");
+    EXPECT_EQ(home_.line({"ls"}).at("isFolder"), true);
+    home_.writeEntry(notes, "Name=x\nX-KvPackageExtensions=note;sketch;\n");
+    const Json package = home_.line({"ls"});
+    EXPECT_EQ(package.at("isFolder"), false);
+    EXPECT_TRUE(text(package, "itemIdentifier").starts_with("did="));
+    // Nobody goes on from a picture in which it is a folder.
+    EXPECT_EQ(home_.error({"changes", "root", "--since", anchor}, 1).at("name"),
+              "syncAnchorExpired");
+}
+
 TEST_F(ApplicationsTest, doctorNamesTheExtensionsOfPackages) {
     home_.writeEntry(notes, "Name=x\nX-KvPackageExtensions=note;sketch;\n");
     EXPECT_THAT(text(finding("package-extensions"), "message"), HasSubstr(".note, .sketch"));
