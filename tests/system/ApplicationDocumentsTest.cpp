@@ -58,6 +58,7 @@ TEST_F(ApplicationDocumentsTest, aLibraryIsListedWithoutWhatIsHiddenInIt) {
     writeFile(inNotes("note.txt"), "note");
     makeFolder(inNotes("folder/deeper"));
     makeFolder(inNotes("Inbox"));
+    makeFolder(inNotes(".Trash"));
     writeFile(inNotes(".Trash/thrown.txt"), "");
     const auto items = home_.lines({"ls", notesItem});
     EXPECT_THAT(field(items, "filename"), UnorderedElementsAre("note.txt", "folder"));
@@ -113,7 +114,7 @@ TEST_F(ApplicationDocumentsTest, clientsOfAServiceAreToldOfApplicationsThatComeA
                                            std::pair("working-set", otherSet)}) {
         const Json answer = changes(container, since);
         EXPECT_THAT(identifiers(answer.at("updated")), Contains("#" + sketch)) << container;
-        EXPECT_THAT(answer.at("deleted"), Contains(notesItem)) << container;
+        EXPECT_THAT(answer.at("deleted"), Contains(notesItem)) << container << answer;
         const Json next = changes(container, text(answer, "anchor"));
         EXPECT_THAT(next.at("updated"), IsEmpty()) << container;
         EXPECT_THAT(next.at("deleted"), IsEmpty()) << container;
@@ -170,12 +171,13 @@ TEST_F(ApplicationDocumentsTest, aSearchFindsDocumentsOfApplicationsWhileTheyAre
                 UnorderedElementsAre("minutes.txt", "minutes of mine.txt"));
 }
 
-TEST_F(ApplicationDocumentsTest, documentsMoveBetweenALibraryAndTheRoot) {
+TEST_F(ApplicationDocumentsTest, documentsMoveBetweenALibraryAndTheUsersOwn) {
+    makeFolder(home_.document("sub"));
     writeFile(inNotes("note.txt"), "note");
     const std::string identifier = identifierAt(inNotes("note.txt"));
-    const Json moved = home_.line({"move", identifier, "--to", "root"});
+    const Json moved = home_.line({"move", identifier, "--to", home_.identifierOf("sub")});
     EXPECT_EQ(moved.at("itemIdentifier"), identifier);
-    EXPECT_EQ(moved.at("path"), home_.document("note.txt"));
+    EXPECT_EQ(moved.at("path"), home_.document("sub/note.txt"));
     EXPECT_EQ(home_.line({"move", identifier, "--to", notesItem}).at("path"), inNotes("note.txt"));
     const Json trashed = home_.line({"trash", identifier});
     EXPECT_EQ(trashed.at("path"), inNotes(".Trash/note.txt"));
