@@ -82,9 +82,9 @@ class Store::Core {
     };
     // What a look at the disk brought for one request.
     struct Looked {
-        std::size_t request;
+        std::size_t request = 0;
         EntryLook look;
-        bool stands;  // at its name; else it went between the listing and the look
+        bool stands = false;  // at its name; else it went between the listing and the look
     };
 
     Core(const StoreOptions& options, StateFolder state, StoreFolder folder, StoreLock lock,

@@ -141,7 +141,10 @@ class StoreFullDiskTest : public testing::Test {
         }
     }
     [[nodiscard]] StoreOptions options() const {
-        return {.stateFolder = state_, .cacheFolder = "", .rootPath = root_};
+        StoreOptions options;
+        options.stateFolder = state_;
+        options.rootPath = root_;
+        return options;
     }
     void fill() {
         std::string block(4096, 'f');

@@ -46,8 +46,8 @@ struct StoreOptions {
     // The folder whose tree is indexed, canonical (no links in it). Must exist and be a folder.
     std::string rootPath;
     // Folders outside of the root whose trees are recorded beside it from the start; see
-    // Store::setLibraries.
-    std::vector<LibraryFolder> libraries = {};
+    // Store::setLibraries. Options that are named one by one may leave it out.
+    std::vector<LibraryFolder> libraries = {};  // NOLINT(readability-redundant-member-init)
     // How long to wait while another process has the store. Zero: not at all; no value: for ever.
     std::optional<std::chrono::milliseconds> lockWait = std::chrono::milliseconds(0);
     // Asked while another process has the store, whenever something appears in the state folder:
