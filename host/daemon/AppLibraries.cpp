@@ -14,13 +14,6 @@ namespace {
 // The registry may change again while the working set is brought up to it.
 constexpr int mostRounds = 5;
 
-// Tells nobody.
-void askForChanges(FileProviderEnumerator& enumerator, const Data& since) {
-    const auto collector = std::make_shared<ChangesCollector>();
-    enumerator.enumerateChangesForObserver(collector, since);
-    (void)collector->wait();
-}
-
 }  // namespace
 
 AppLibraries::AppLibraries(FileProviderExtension& extension, std::function<void()> changed,
@@ -91,8 +84,8 @@ std::optional<std::uint64_t> AppLibraries::prime() {
             anchor = current;
         });
         const bool isBehind = anchor && libraryVersionIn(*anchor) != newest;
-        if (isBehind) {
-            askForChanges(**workingSet, withoutLibraryVersion(*anchor));
+        if (isBehind || (anchor && version_ != newest && *newest != 0 && round == 0)) {
+            askForAll(**workingSet, *anchor);
         }
         (*workingSet)->invalidate();
         if (!isBehind) {
@@ -100,6 +93,15 @@ std::optional<std::uint64_t> AppLibraries::prime() {
         }
     }
     return newest;
+}
+
+void AppLibraries::askForAll(FileProviderEnumerator& workingSet, const Data& anchor) {
+    const Data since = withoutLibraryVersion(anchor);
+    const auto collector = std::make_shared<ChangesCollector>();
+    workingSet.enumerateChangesForObserver(collector, since);
+    if (auto changes = collector->wait()) {
+        told_.complete(since, *changes);
+    }
 }
 
 std::optional<Data> AppLibraries::freshAnchor(std::string_view container) const {

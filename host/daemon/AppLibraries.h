@@ -8,6 +8,7 @@
 #include <string_view>
 
 #include "host/daemon/AppRefreshRequests.h"
+#include "host/daemon/ToldLibraries.h"
 #include "platform/foundation/SerialQueue.h"
 #include "platform/hostframework/FileProviderExtension.h"
 
@@ -38,18 +39,23 @@ class AppLibraries {
     // and everybody knows of it.
     void refreshNow();
 
+    // See ToldLibraries.
+    void complete(const Data& since, ItemChanges& changes) { told_.complete(since, changes); }
+
   private:
     void refreshed();
     void follow();
     void bringUp();
     // Has the working set brought up to the newest version, which is answered; none where anchors
-    // tell of no version.
+    // tell of no version. Asks once at least, for what libraries there are.
     std::optional<std::uint64_t> prime();
+    void askForAll(FileProviderEnumerator& workingSet, const Data& anchor);
     [[nodiscard]] std::optional<Data> freshAnchor(std::string_view container) const;
 
     FileProviderExtension& extension_;
     const std::function<void()> changed_;
     const std::function<void()> knownTo_;
+    ToldLibraries told_;
     std::atomic<bool> wasRefreshed_ = false;
     std::once_flag known_;
     std::atomic<bool> isKnown_ = false;

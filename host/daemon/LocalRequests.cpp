@@ -126,6 +126,9 @@ Expected<ItemChanges> LocalRequests::changes(std::string_view container, const D
     const auto collector = std::make_shared<ChangesCollector>();
     enumerator->enumerateChangesForObserver(collector, since);
     auto changes = collector->wait();
+    if (changes && isSystemContainer(container)) {
+        libraries_.complete(since, *changes);
+    }
     release(container, changes ? std::optional(changes->anchor) : std::nullopt,
             std::move(enumerator));
     return changes;
