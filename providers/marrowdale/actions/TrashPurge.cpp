@@ -24,19 +24,28 @@ namespace {
 // So many entries of a trash are held at once.
 constexpr std::uint64_t entriesAtOnce = 1000;
 
+// Where hosts hear that a run is over. It goes with the world: whoever leaves a run last need not
+// wait until the host has heard.
+struct Notifier {
+    const SerialQueue queue{"marrowdale.auto-delete.notifier"};
+};
+
 // The deletions of one run, and the run itself: who leaves last has the host told.
 class Deletions {
   public:
-    explicit Deletions(std::function<void()> handler) : handler_(std::move(handler)) {}
+    Deletions(const Platform& platform, std::function<void()> handler)
+        : queue_(platform.shared.get<Notifier>("marrowdale.auto-delete-notifier").queue),
+          handler_(std::move(handler)) {}
 
     void enter() { ++pending_; }
     void leave() {
         if (--pending_ == 0) {
-            SerialQueue("marrowdale.auto-delete.notifier").async(std::move(handler_));
+            queue_.async(std::move(handler_));
         }
     }
 
   private:
+    const SerialQueue& queue_;
     std::atomic<std::uint64_t> pending_ = 1;  // the run
     std::function<void()> handler_;
 };
@@ -63,7 +72,6 @@ class Purge {
     void run(const URL& folder) const {
         FSDirectoryEnumerator request;
         request.urls = {folder};
-        request.attributeNames = {std::string(trashDateAttribute)};
         std::unique_ptr<DirectoryEnumerator> walk;
         do {
             request.limit = entriesAtOnce;
@@ -75,7 +83,8 @@ class Purge {
                 return;
             }
             for (const URL& entry : entries) {
-                judge(entry);
+                // What the listing learnt may be old by now, and this can't be undone.
+                judge(entry.withoutCachedValues());
             }
             request.offset = result->position;
             request.startPosition = std::move(result->nextPosition);
@@ -148,7 +157,7 @@ void removeTrashedItemsOlderThan(const Platform& platform, const Date& date,
                                  std::function<void()> handler) {
     const LogSection section(platform.log,
                              [&] { return "remove trashed items older than " + date.rfc3339(); });
-    const auto deletions = std::make_shared<Deletions>(std::move(handler));
+    const auto deletions = std::make_shared<Deletions>(platform, std::move(handler));
     const Purge purge(platform, date, deletions);
     for (const URL& folder : trashFolders(platform)) {
         purge.run(folder);

@@ -169,28 +169,75 @@ TEST_P(TrashPurgeTest, whatHasNoIdentifierStays) {
 
 TEST_P(TrashPurgeTest, theHostIsToldAfterTheLastDeletion) {
     addTrashed(".Trash/old", before_);
-    FileOperations::ErrorHandler kept;
+    addTrashed(".Trash/older", before_);
+    std::vector<FileOperations::ErrorHandler> kept;
     class Keeping final : public ForwardingFileOperations {
       public:
-        Keeping(FileOperations& target, ErrorHandler& kept)
+        Keeping(FileOperations& target, std::vector<ErrorHandler>& kept)
             : ForwardingFileOperations(target), kept_(kept) {}
         void deleteItemAtURL(const URL& /*item*/, ErrorHandler handler) override {
-            kept_ = std::move(handler);
+            kept_.push_back(std::move(handler));
         }
 
       private:
-        ErrorHandler& kept_;
+        std::vector<ErrorHandler>& kept_;
     } keeping(world_.fileOperations, kept);
     const Platform platform = withFileOperations(platform_, keeping);
     std::promise<void> done;
     auto told = done.get_future();
     removeTrashedItemsOlderThan(platform, reference_, [&] { done.set_value(); });
-    ASSERT_TRUE(kept);
+    ASSERT_EQ(kept.size(), 2U);
     // The section is closed, the host not told.
     EXPECT_TRUE(world_.sink->lines().back().starts_with("[DEBUG] ┗"));
     EXPECT_EQ(told.wait_for(std::chrono::seconds(0)), std::future_status::timeout);
-    kept(std::nullopt);
+    kept[0](std::nullopt);
+    EXPECT_EQ(told.wait_for(std::chrono::seconds(0)), std::future_status::timeout);
+    kept[1](std::nullopt);
     EXPECT_EQ(told.wait_for(std::chrono::seconds(60)), std::future_status::ready);
+}
+
+// Where nothing is deleted too.
+TEST_P(TrashPurgeTest, theCallReturnsBeforeTheHostHasHeard) {
+    std::promise<void> returned;
+    std::promise<bool> heard;
+    removeTrashedItemsOlderThan(platform_, reference_, [&] {
+        heard.set_value(returned.get_future().wait_for(std::chrono::seconds(60)) ==
+                        std::future_status::ready);
+    });
+    returned.set_value();
+    EXPECT_TRUE(heard.get_future().get());
+}
+
+// Its date is read when it is judged, not when the folder was listed.
+TEST_P(TrashPurgeTest, whatIsTrashedAnewMeanwhileStays) {
+    addTrashed(".Trash/a", before_);
+    addTrashed(".Trash/b", before_);
+    world_.fileOperations.answer = [&](Operation, const URL&) -> std::optional<Expected<URL>> {
+        setDate(".Trash/a", after_);  // both are still there at the first deletion
+        setDate(".Trash/b", after_);
+        return std::nullopt;
+    };
+    purge();
+    EXPECT_EQ(int{exists(".Trash/a")} + int{exists(".Trash/b")}, 1);
+}
+
+TEST_P(TrashPurgeTest, whatCanNotBeDatedStays) {
+    writeFile(path(".Trash/undated"), "");
+    class Refusing final : public ForwardingExtendedAttributes {
+      public:
+        using ForwardingExtendedAttributes::ForwardingExtendedAttributes;
+        Expected<void> set(const OpenFile& file, std::string_view /*name*/,
+                           const Data& /*value*/) override {
+            return Unexpected(errorWithPOSIXCode(ENOSPC, "set an attribute of", file.url().path()));
+        }
+    } refusing(platform_.extendedAttributes);
+    const Platform platform = withExtendedAttributes(platform_, refusing);
+    std::promise<void> done;
+    removeTrashedItemsOlderThan(platform, reference_, [&] { done.set_value(); });
+    done.get_future().get();
+    EXPECT_TRUE(exists(".Trash/undated"));
+    EXPECT_FALSE(dateOf(".Trash/undated"));
+    EXPECT_EQ(world_.sink->countOfLevel(LogLevel::error), 1U);
 }
 
 TEST_P(TrashPurgeTest, anyNumberOfEntriesGoes) {
