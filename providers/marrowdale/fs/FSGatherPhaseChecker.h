@@ -12,7 +12,7 @@ namespace marrowdale {
 // Reads a history to its end, for the length of one check, and keeps what it found.
 //
 // `sema` is signalled when the history is done, and at a reset, behind which nothing could change
-// the answer any more: a reset is kept, and of several deletions the last.
+// the answer any more: a reset is kept, and of several deletions the first.
 class FSGatherPhaseChecker : public FSEventReaderDelegate {
   public:
     // Touched on the reader's queue alone.
