@@ -158,6 +158,8 @@ std::expected<std::unique_ptr<HostService>, Failure> CommandContext::startServic
         return std::unexpected(options.error());
     }
     const std::string state = options->settings.stateFolder;
+    // A one-shot ends some time, however much it has to copy.
+    options->lockWait = std::chrono::hours(24 * 365);
     std::unique_ptr<RemoteRequests> running;
     options->isServed = [&] {
         if (auto remote = RemoteRequests::connect(state)) {

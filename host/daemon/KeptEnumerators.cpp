@@ -35,7 +35,9 @@ void KeptEnumerators::keep(std::string_view container, const Data& anchor,
     std::unique_ptr<FileProviderEnumerator> leaving;
     {
         const std::lock_guard lock(mutex_);
-        if (!version || count(container, *version) >= mostOfOneVersion) {
+        // Version 0 is everybody's who was told of no library yet, and such an enumerator is never
+        // brought further: a fresh one knows what came meanwhile.
+        if (!version || *version == 0 || count(container, *version) >= mostOfOneVersion) {
             leaving = std::move(enumerator);
         } else {
             kept_.push_back({std::string(container), *version, std::move(enumerator)});

@@ -52,6 +52,12 @@ TEST_F(KeptEnumeratorsTest, withoutAVersionNoneIsKept) {
     EXPECT_FALSE(kept_.take("root", Data::fromText("junk")));
 }
 
+TEST_F(KeptEnumeratorsTest, whoKnowsOfNoLibraryIsAnsweredByAFreshOne) {
+    keep("root", 0);
+    EXPECT_EQ(extension_.state->alive, 0);
+    EXPECT_FALSE(takes("root", 0));
+}
+
 TEST_F(KeptEnumeratorsTest, anAnchorTellsItsVersionAndCanForgetIt) {
     const Data anchor = VersionedExtension::anchorOf(5);
     EXPECT_EQ(libraryVersionIn(anchor), 5U);

@@ -99,7 +99,7 @@ class VersionedExtension : public FakeExtension {
             {
                 const std::lock_guard lock(state_->mutex);
                 isKnown = since == 0 || since == version_;
-                if (isKnown) {
+                if (isKnown && (since != 0 || isWorkingSet())) {
                     version_ = state_->main;
                     state_->workingSet = isWorkingSet() ? version_ : state_->workingSet;
                 }

@@ -28,6 +28,12 @@ std::string_view words(Refusal refusal) {
     return "there are none";
 }
 
+// Whether the provider serves the documents of such an application.
+bool isServed(const DesktopEntry& entry) {
+    return entry.says("KvSupportsDocumentBrowser") ||
+           (entry.says("KvSupportsOpenInPlace") && entry.says("KvFileSharingEnabled"));
+}
+
 }  // namespace
 
 // What one reading of all folders found.
@@ -155,6 +161,9 @@ std::shared_ptr<const LinuxApplicationRegistry::Scan> LinuxApplicationRegistry::
         }
         std::ranges::copy(found.entry->packageExtensions(),
                           std::back_inserter(scan->packageExtensions));
+        if (!isServed(*found.entry)) {
+            continue;
+        }
         auto container = scan->containers.containerOf(identifier);
         if (container.refusal == Refusal::none) {
             scan->documentFolders.emplace_back(container.path + "/" + std::string(documentsName),

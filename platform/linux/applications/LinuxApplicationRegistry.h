@@ -51,8 +51,8 @@ class LinuxApplicationRegistry final : public ApplicationRegistry {
     std::optional<PropertyListDictionary> infoValuesForKeys(
         const BundleRecord& record, std::span<const std::string_view> keys) override;
 
-    // The documents folders of all applications that say anything about documents, sorted: more
-    // than those that are served, never less. Reads the registry anew.
+    // The documents folders of the applications that want theirs served, sorted. No others: one
+    // that comes to be served is new then, with all that is in it. Reads the registry anew.
     [[nodiscard]] std::vector<std::string> documentFolders();
     // What such applications declare as the extensions of packages, sorted.
     [[nodiscard]] std::vector<std::string> packageExtensions();

@@ -182,6 +182,22 @@ TEST_F(LinuxApplicationRegistryTest, aContainerIsARealFolderWithRealDocuments) {
     EXPECT_TRUE(registry_.documentFolders().empty());
 }
 
+TEST_F(LinuxApplicationRegistryTest, foldersAreThoseOfApplicationsThatWantThemServed) {
+    const std::string head = "[Desktop Entry]\nType=Application\nName=A\n";
+    makeContainer("org.example.A");
+    for (const char* lines : {"", "X-KvFileSharingEnabled=true\n", "X-KvSupportsOpenInPlace=true\n",
+                              "X-KvSupportsDocumentBrowser=false\n"}) {
+        writeFile(userEntry("org.example.A"), head + lines);
+        EXPECT_TRUE(registry_.documentFolders().empty()) << lines;
+    }
+    for (const char* lines : {"X-KvFileSharingEnabled=true\nX-KvSupportsOpenInPlace=true\n",
+                              "X-KvSupportsDocumentBrowser=true\n"}) {
+        writeFile(userEntry("org.example.A"), head + lines);
+        EXPECT_EQ(registry_.documentFolders(), Names{container("org.example.A") + "/Documents"})
+            << lines;
+    }
+}
+
 TEST_F(LinuxApplicationRegistryTest, aHomeBehindALinkHasContainersAtTheirRealPlace) {
     writeFile(userEntry("org.example.A"), entry("A"));
     makeContainer("org.example.A");

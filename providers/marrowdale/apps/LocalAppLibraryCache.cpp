@@ -132,7 +132,6 @@ BundleRecords LocalAppLibraryCache::recordsInData(const Data& data) {
         return "loaded " + std::to_string(records.size()) + " app library items from data";
     });
     versionToken_ = *token;
-    wasReset_ = false;
     platform_.log.debug([&] {
         return "version token was set to " + std::to_string(versionToken_) + " after load";
     });
@@ -141,7 +140,6 @@ BundleRecords LocalAppLibraryCache::recordsInData(const Data& data) {
 
 BundleRecords LocalAppLibraryCache::reset() {
     versionToken_ = 0;
-    wasReset_ = true;
     return {};
 }
 
@@ -175,18 +173,12 @@ Expected<std::uint64_t> LocalAppLibraryCache::save(const BundleRecords& records,
         return "wrote on disk " + std::to_string(data->size()) + " bytes at " + shortPath();
     });
     versionToken_ = versionToken;
-    wasReset_ = false;
     return versionToken;
 }
 
 std::uint64_t LocalAppLibraryCache::versionToken() const {
     assertOnQueue();
     return versionToken_;
-}
-
-bool LocalAppLibraryCache::wasReset() const {
-    assertOnQueue();
-    return wasReset_;
 }
 
 std::string LocalAppLibraryCache::shortPath() const {

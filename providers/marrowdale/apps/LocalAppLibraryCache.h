@@ -45,9 +45,6 @@ class LocalAppLibraryCache {
                                                std::uint64_t versionToken, Bump bump);
     // Of the list that was last loaded or saved; 0 before that.
     [[nodiscard]] std::uint64_t versionToken() const;
-    // Whether the list that was last loaded or saved is nothing because its file was missing or
-    // no use.
-    [[nodiscard]] bool wasReset() const;
 
     [[nodiscard]] const URL& cacheURL() const { return cacheURL_; }
     // The path for log lines: "~/" and its last four components.
@@ -64,7 +61,6 @@ class LocalAppLibraryCache {
     const SerialQueue queue_;
     const URL cacheURL_;
     std::uint64_t versionToken_ = 0;  // on queue_
-    bool wasReset_ = false;           // on queue_
 };
 
 }  // namespace marrowdale

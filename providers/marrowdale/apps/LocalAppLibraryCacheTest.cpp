@@ -230,7 +230,7 @@ TEST_F(LocalAppLibraryCacheTest, aFileCutAnywhereOrWithAnyByteChangedNeverBreaks
             bytes[at] = static_cast<std::uint8_t>(bytes[at] ^ flip);
             putData(Data(std::move(bytes)));
             const auto records = load();
-            EXPECT_TRUE(records.empty() || token() != 0 || records.size() == 2);
+            EXPECT_TRUE(token() != 0 || records.empty());
         }
     }
 }
