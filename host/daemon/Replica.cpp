@@ -2,6 +2,8 @@
 
 #include <charconv>
 #include <filesystem>
+#include <map>
+#include <ranges>
 #include <system_error>
 
 #include "host/requests/FeedJson.h"
@@ -12,7 +14,7 @@ namespace marrowdale::host {
 
 namespace {
 
-constexpr std::int64_t formatVersion = 2;
+constexpr std::int64_t formatVersion = 3;
 
 // The index holds three letters of every name and tag at each place, so that any part of three
 // letters or more is found without reading all names.
@@ -20,10 +22,13 @@ constexpr const char* tables = R"(
 CREATE TABLE items (
     number INTEGER PRIMARY KEY, identifier TEXT UNIQUE NOT NULL, parent TEXT NOT NULL,
     file INTEGER, domain TEXT,
-    name TEXT NOT NULL, tags TEXT NOT NULL, item TEXT NOT NULL);
+    name TEXT NOT NULL, tags TEXT NOT NULL, favorite INTEGER, used TEXT, item TEXT NOT NULL);
 CREATE INDEX items_by_parent ON items (parent);
 CREATE INDEX items_by_file ON items (file);
 CREATE INDEX items_by_domain ON items (domain) WHERE domain IS NOT NULL;
+CREATE INDEX items_by_favorite ON items (favorite) WHERE favorite IS NOT NULL;
+CREATE INDEX items_by_used ON items (used) WHERE used IS NOT NULL;
+CREATE INDEX items_by_tags ON items (tags) WHERE tags <> '';
 CREATE VIRTUAL TABLE names USING fts5(name, tags, content='items', content_rowid='number',
                                       tokenize='trigram');
 CREATE TRIGGER items_added AFTER INSERT ON items BEGIN
@@ -33,7 +38,7 @@ CREATE TRIGGER items_removed AFTER DELETE ON items BEGIN
     INSERT INTO names(names, rowid, name, tags) VALUES ('delete', old.number, old.name, old.tags);
 END;
 CREATE TABLE state (anchor TEXT);
-PRAGMA user_version=2;
+PRAGMA user_version=3;
 )";
 
 constexpr std::size_t shortestIndexed = 3;
@@ -210,8 +215,8 @@ Expected<void> Replica::put(const FileProviderItem& item) {
         return removed;
     }
     auto statement = database_.prepare(
-        "INSERT INTO items (identifier, parent, file, domain, name, tags, item) "
-        "VALUES (?,?,?,?,?,?,?)");
+        "INSERT INTO items (identifier, parent, file, domain, name, tags, item, favorite, used) "
+        "VALUES (?,?,?,?,?,?,?,?,?)");
     if (!statement) {
         return Unexpected(statement.error());
     }
@@ -226,10 +231,18 @@ Expected<void> Replica::put(const FileProviderItem& item) {
     } else {
         statement->bindNull(4);
     }
-    return statement->bind(5, item.filename)
-        .bind(6, joinedTags(item))
-        .bind(7, itemJson(item))
-        .run();
+    statement->bind(5, item.filename).bind(6, joinedTags(item)).bind(7, itemJson(item));
+    if (item.favoriteRank) {
+        statement->bind(8, std::int64_t{1});
+    } else {
+        statement->bindNull(8);
+    }
+    if (item.lastUsedDate) {
+        statement->bind(9, item.lastUsedDate->rfc3339());
+    } else {
+        statement->bindNull(9);
+    }
+    return statement->run();
 }
 
 Expected<void> Replica::removeWhere(const std::string& condition, std::string_view value) {
@@ -315,6 +328,13 @@ Expected<std::vector<FileProviderItemPtr>> Replica::search(std::span<const std::
         }
     }
     statement->bind(++position, limit);
+    return itemsOf(std::move(statement));
+}
+
+Expected<std::vector<FileProviderItemPtr>> Replica::itemsOf(Expected<Statement> statement) {
+    if (!statement) {
+        return Unexpected(statement.error());
+    }
     std::vector<FileProviderItemPtr> found;
     while (true) {
         const auto hasRow = statement->step();
@@ -330,6 +350,54 @@ Expected<std::vector<FileProviderItemPtr>> Replica::search(std::span<const std::
         }
         found.push_back(std::move(*item));
     }
+}
+
+Expected<std::vector<FileProviderItemPtr>> Replica::collection(const ItemCollection& collection,
+                                                               std::int64_t limit) {
+    if (collection.kind == ItemCollection::Kind::tagged) {
+        auto tagged = database_.prepare(
+            "SELECT item FROM items WHERE tags <> '' AND "
+            "instr(char(10) || tags, char(10) || ? || char(10)) ORDER BY name LIMIT ?");
+        if (tagged) {
+            tagged->bind(1, collection.tag).bind(2, limit);
+        }
+        return itemsOf(std::move(tagged));
+    }
+    auto statement = database_.prepare(
+        collection.kind == ItemCollection::Kind::favorites
+            ? "SELECT item FROM items WHERE favorite IS NOT NULL ORDER BY name LIMIT ?"
+            : "SELECT item FROM items WHERE used IS NOT NULL ORDER BY used DESC LIMIT ?");
+    if (statement) {
+        statement->bind(1, limit);
+    }
+    return itemsOf(std::move(statement));
+}
+
+Expected<std::vector<TagCount>> Replica::tags() {
+    auto statement = database_.prepare("SELECT tags FROM items WHERE tags <> ''");
+    if (!statement) {
+        return Unexpected(statement.error());
+    }
+    std::map<std::string, std::uint64_t> counts;
+    while (true) {
+        const auto hasRow = statement->step();
+        if (!hasRow) {
+            return Unexpected(hasRow.error());
+        }
+        if (!*hasRow) {
+            break;
+        }
+        for (const auto tag : std::views::split(statement->text(0), '\n')) {
+            if (!tag.empty()) {
+                ++counts[std::string(tag.begin(), tag.end())];
+            }
+        }
+    }
+    std::vector<TagCount> tags;
+    for (const auto& [tag, count] : counts) {
+        tags.push_back({tag, count});
+    }
+    return tags;
 }
 
 Expected<std::uint64_t> Replica::count() {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <span>
 #include <string>
@@ -10,6 +11,24 @@
 #include "host/requests/HostRequests.h"
 
 namespace marrowdale::host {
+
+// Items that have something in common, wherever they are.
+struct ItemCollection {
+    enum class Kind : std::uint8_t {
+        favorites,
+        recents,  // those with a last-used date, the latest first
+        tagged,   // with exactly this tag
+    };
+    Kind kind = Kind::favorites;
+    std::string tag = {};
+};
+
+struct TagCount {
+    std::string tag;
+    std::uint64_t items = 0;
+
+    friend bool operator==(const TagCount&, const TagCount&) = default;
+};
 
 // The items that the host was told of, on disk, with the anchor up to which they are told; names
 // and tags are searchable. Everything in it can be made again by listing. One thread at a time.
@@ -39,6 +58,12 @@ class Replica {
     [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> search(
         std::span<const std::string> words, std::int64_t limit);
 
+    // The items that belong to a collection, at most `limit` of them.
+    [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> collection(
+        const ItemCollection& collection, std::int64_t limit);
+    // Every tag, and how many items have it, in the order of the tags' bytes.
+    [[nodiscard]] Expected<std::vector<TagCount>> tags();
+
     [[nodiscard]] Expected<std::uint64_t> count();
 
   private:
@@ -51,6 +76,8 @@ class Replica {
     [[nodiscard]] Expected<void> removeTree(std::string_view identifier);
     [[nodiscard]] Expected<void> removeWhere(const std::string& condition, std::string_view value);
     [[nodiscard]] Expected<void> writeAnchor(const Data& anchor);
+    [[nodiscard]] static Expected<std::vector<FileProviderItemPtr>> itemsOf(
+        Expected<Statement> statement);
 
     Database database_;
 };

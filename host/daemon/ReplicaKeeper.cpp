@@ -44,18 +44,34 @@ auto ReplicaKeeper::withReplica(const Work& work) -> decltype(work(std::declval<
     }
 }
 
+template <typename Work>
+auto ReplicaKeeper::withNewest(const Work& work) -> decltype(work(std::declval<Replica&>())) {
+    using Result = decltype(work(std::declval<Replica&>()));
+    return withReplica([&](Replica& replica) -> Result {
+        if (auto followed = follow(replica); !followed) {
+            return Unexpected(followed.error());
+        }
+        return work(replica);
+    });
+}
+
 Expected<void> ReplicaKeeper::catchUp() {
     return withReplica([this](Replica& replica) { return follow(replica); });
 }
 
 Expected<std::vector<FileProviderItemPtr>> ReplicaKeeper::search(
     std::span<const std::string> words) {
-    return withReplica([&](Replica& replica) -> Expected<std::vector<FileProviderItemPtr>> {
-        if (auto followed = follow(replica); !followed) {
-            return Unexpected(followed.error());
-        }
-        return replica.search(words, mostResults);
-    });
+    return withNewest([&](Replica& replica) { return replica.search(words, mostResults); });
+}
+
+Expected<std::vector<FileProviderItemPtr>> ReplicaKeeper::collection(
+    const ItemCollection& collection) {
+    return withNewest(
+        [&](Replica& replica) { return replica.collection(collection, mostResults); });
+}
+
+Expected<std::vector<TagCount>> ReplicaKeeper::tags() {
+    return withNewest([](Replica& replica) { return replica.tags(); });
 }
 
 void ReplicaKeeper::removeDomains(std::vector<std::string> domains) {

@@ -25,6 +25,10 @@ class ReplicaKeeper {
     // Catches up, then answers what Replica::search does.
     [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> search(
         std::span<const std::string> words);
+    // Catch up, then answer what the replica does.
+    [[nodiscard]] Expected<std::vector<FileProviderItemPtr>> collection(
+        const ItemCollection& collection);
+    [[nodiscard]] Expected<std::vector<TagCount>> tags();
     // The items of these domains are not found any more. Waits for nobody: whoever brings the
     // replica up to date may be waited for, and may be waiting for this. They are taken out before
     // anything else is found.
@@ -35,6 +39,9 @@ class ReplicaKeeper {
     // tried once more.
     template <typename Work>
     auto withReplica(const Work& work) -> decltype(work(std::declval<Replica&>()));
+    // The same once it has caught up.
+    template <typename Work>
+    auto withNewest(const Work& work) -> decltype(work(std::declval<Replica&>()));
     [[nodiscard]] Expected<void> follow(Replica& replica);
     [[nodiscard]] Expected<void> removeLeavingDomains(Replica& replica);
     // False when the anchor has expired.

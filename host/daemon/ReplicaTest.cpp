@@ -44,6 +44,39 @@ class ReplicaTest : public ::testing::Test {
     Replica replica_;
 };
 
+TEST_F(ReplicaTest, favoritesRecentsAndTaggedItemsAreFound) {
+    auto favorite = item("did=1", "favorite", 1);
+    favorite->favoriteRank = Number(std::int64_t{5});
+    auto older = item("did=2", "older", 2);
+    older->lastUsedDate = Date{1'000'000'000, 0};
+    auto newer = item("did=3", "newer", 3);
+    newer->lastUsedDate = Date{1'500'000'000, 1};
+    const std::vector<std::string> red{"Red", "work"};
+    const std::vector<std::string> redder{"Redder"};
+    older->tagData = tagDataFor(red);
+    newer->tagData = tagDataFor(redder);
+    add({favorite, older, newer, item("did=4", "plain", 4)});
+    using Kind = ItemCollection::Kind;
+    const auto names = [&](const ItemCollection& collection, std::int64_t limit = 100) {
+        std::vector<std::string> all;
+        const auto items = replica_.collection(collection, limit);
+        for (const auto& each : items.value()) {
+            all.push_back(each->filename);
+        }
+        return all;
+    };
+    EXPECT_THAT(names({Kind::favorites}), ElementsAre("favorite"));
+    EXPECT_THAT(names({Kind::recents}), ElementsAre("newer", "older"));
+    EXPECT_THAT(names({Kind::recents}, 1), ElementsAre("newer"));
+    EXPECT_THAT(names({Kind::tagged, "Red"}), ElementsAre("older"));
+    EXPECT_THAT(names({Kind::tagged, "Re"}), IsEmpty());
+    EXPECT_THAT(replica_.tags().value(),
+                ElementsAre(TagCount{"Red", 1}, TagCount{"Redder", 1}, TagCount{"work", 1}));
+    favorite->favoriteRank = std::nullopt;
+    add({favorite});
+    EXPECT_THAT(names({Kind::favorites}), IsEmpty());
+}
+
 TEST_F(ReplicaTest, anyPartOfANameOrTagIsFoundWithoutRegardToCase) {
     const std::vector<std::string> tags{"Important", "x"};
     auto tagged = item("did=1", "letter", 1);
