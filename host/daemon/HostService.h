@@ -18,7 +18,10 @@ class HostService {
     [[nodiscard]] static Started<std::unique_ptr<HostService>> start(WorldOptions options);
 
     [[nodiscard]] LocalRequests& requests() { return world_->requests(); }
+    // What answers programs, for those who take their requests in another way.
+    [[nodiscard]] Api& api() { return api_; }
     [[nodiscard]] const Settings& settings() const { return world_->settings(); }
+    [[nodiscard]] Log& log() const { return world_->log(); }
 
   private:
     explicit HostService(std::unique_ptr<World> world)

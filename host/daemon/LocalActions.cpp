@@ -157,12 +157,8 @@ Item LocalActions::untrash(const ItemAction& action) {
     auto parent = action.parent;
     const auto item = extension_.itemForIdentifier(action.item);
     if (!parent && item && (*item)->isTrashed && isOfTheUsersOwn(**item)) {
-        parent = parents_.parentOf((*item)->itemIdentifier);
-        const auto folder = parent ? extension_.itemForIdentifier(*parent) : Item(nullptr);
-        const bool isGone = !folder || !*folder || (*folder)->isTrashed || !(*folder)->isFolder();
-        if (isGone) {
-            parent = VantrelRootContainerItemIdentifier;
-        }
+        parent = putBackParent((*item)->itemIdentifier)
+                     .value_or(std::string(VantrelRootContainerItemIdentifier));
     }
     auto back = waitFor(
         [&](auto handler) { extension_.untrashItemWithIdentifier(action.item, parent, handler); });
@@ -170,6 +166,13 @@ Item LocalActions::untrash(const ItemAction& action) {
         parents_.forget(action.item);
     }
     return back;
+}
+
+std::optional<std::string> LocalActions::putBackParent(std::string_view item) {
+    auto parent = parents_.parentOf(item);
+    const auto folder = parent ? extension_.itemForIdentifier(*parent) : Item(nullptr);
+    const bool isThere = folder && *folder && !(*folder)->isTrashed && (*folder)->isFolder();
+    return isThere ? std::move(parent) : std::nullopt;
 }
 
 Item LocalActions::remove(const ItemAction& action) {

@@ -1,8 +1,10 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <stop_token>
 #include <string>
+#include <string_view>
 
 #include "host/daemon/PutBackParents.h"
 #include "host/requests/ItemAction.h"
@@ -27,6 +29,9 @@ class LocalActions {
     [[nodiscard]] Expected<FileProviderItemPtr> perform(const ItemAction& action,
                                                         ActionObserver& observer,
                                                         const std::stop_token& stop);
+    // The folder that a trashed item of the user's own documents goes back to, as far as it is
+    // remembered and there.
+    [[nodiscard]] std::optional<std::string> putBackParent(std::string_view item);
 
   private:
     [[nodiscard]] Expected<void> checkCapabilities(const ItemAction& action);

@@ -72,6 +72,9 @@ class LocalRequests final : public HostRequests {
         const std::vector<std::string>& identifiers) override;
     [[nodiscard]] Expected<std::vector<Finding>> findings() override;
 
+    [[nodiscard]] std::optional<std::string> putBackParent(std::string_view item) {
+        return actions_.putBackParent(item);
+    }
     [[nodiscard]] ReplicaKeeper& replica() { return replica_; }
     // The applications of the system may have changed: has them looked at again, soon.
     void applicationsChanged() { libraries_.ask(); }
