@@ -205,7 +205,9 @@ export class Actions {
     const all = new Set(items.flatMap((item) => item.tags ?? []));
     const title = items.length === 1 ? t("tagsOf", { name: shownName(items[0].filename) })
       : t("tagsOfMany", { n: items.length });
-    const { tags: known } = await get("/v1/tags");
+    const known = h("datalist", { id: "known-tags" });
+    get("/v1/tags").then(({ tags }) => known.append(
+      ...tags.map(({ tag }) => h("option", { value: tag }))), tellError);
     const wanted = await dialog(title, (close) => {
       const list = h("ul", { class: "tag-list" });
       const show = () => list.replaceChildren(...[...all].map((tag) => h("li", { class: "tag" },
@@ -234,7 +236,7 @@ export class Actions {
       });
       show();
       return [list, h("label", { class: "field" }, h("span", {}, t("addTag")), field),
-              h("datalist", { id: "known-tags" }, known.map(({ tag }) => h("option", { value: tag }))),
+              known,
               buttons(button(t("cancel"), null, () => close(null), { text: true }),
                       button(t("save"), null, () => { add(); close([...all]); },
                              { text: true, kind: "primary" }))];

@@ -7,6 +7,7 @@ import { t } from "./text.js";
 export class Details {
   constructor(actions) {
     this.actions = actions;
+    this.rootPath = "";  // of the documents, once it is known
     this.body = h("div", {});
     this.element = h("aside", { class: "details", "aria-label": t("details") }, this.body);
     this.element.hidden = localStorage.getItem("details") !== "shown";
@@ -41,7 +42,7 @@ export class Details {
     fact(t("lastUsed"), fullDate(item.lastUsedDate));
     fact(t("tags"), (item.tags ?? []).map(shownName).join(", "));
     fact(t("type"), item.isFolder ? "" : item.typeIdentifier);
-    fact(t("where"), shownName(item.path ?? ""));
+    fact(t("where"), this.shownPath(item));
     fact(t("identifier"), item.itemIdentifier);
     this.body.replaceChildren(h("div", { class: "details-icon" }, icon(kind.icon)),
       h("h2", {}, h("bdi", {}, shownName(item.filename))), facts);
@@ -50,10 +51,16 @@ export class Details {
     }
   }
 
+  // From the documents on; in full for what lies elsewhere.
+  shownPath({ path = "" }) {
+    const isWithin = this.rootPath !== "" && (path + "/").startsWith(this.rootPath + "/");
+    return shownName(isWithin ? path.slice(this.rootPath.lastIndexOf("/") + 1) : path);
+  }
+
   async showOrigin(item, facts) {
     const folder = await this.actions.placeOfOrigin(item).catch(() => null);
     if (folder && facts.isConnected) {
-      facts.prepend(h("dt", {}, t("original")), h("dd", {}, h("bdi", {}, shownName(folder.path))));
+      facts.prepend(h("dt", {}, t("original")), h("dd", {}, h("bdi", {}, this.shownPath(folder))));
     }
   }
 }

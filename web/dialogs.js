@@ -106,7 +106,7 @@ export function menu(entries, x, y) {
     items.push(item);
     return item;
   }));
-  document.body.append(element);
+  (document.querySelector("main") ?? document.body).append(element);
   const box = element.getBoundingClientRect();
   element.style.left = `${Math.max(4, Math.min(x, innerWidth - box.width - 4))}px`;
   element.style.top = `${Math.max(4, Math.min(y, innerHeight - box.height - 4))}px`;

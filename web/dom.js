@@ -12,7 +12,7 @@ export function h(tag, attributes = {}, ...children) {
       element.setAttribute(name, value);
     }
   }
-  element.append(...children.flat().filter((child) => child !== null && child !== undefined));
+  element.append(...children.flat(Infinity).filter((child) => child !== null && child !== undefined));
   return element;
 }
 
@@ -26,7 +26,7 @@ const OUTLINES = {
   image: "M4 5h16v14H4zM4 16l4.5-4.5 4 4 3-3L20 17M15.5 9.5h.01",
   audio: "M9 18V6l10-2v12M9 18a2.5 2.5 0 1 1-5 0 2.5 2.5 0 0 1 5 0zM19 16a2.5 2.5 0 1 1-5 0 2.5 2.5 0 0 1 5 0z",
   video: "M3 6h12v12H3zM15 10.5l6-3.5v10l-6-3.5",
-  pdf: "M6 3h8l4 4v14H6zM14 3v4h4M9 17v-5h1.6a1.4 1.4 0 0 1 0 2.9H9M13.5 12v5h1.2a2 2 0 0 0 0-5z",
+  pdf: "M6 3h8l4 4v14H6zM14 3v4h4M10 18v-6h2.2a1.8 1.8 0 0 1 0 3.6H10",
   archive: "M4 4h16v4H4zM5.5 8v12h13V8M10 12h4",
   table: "M4 5h16v14H4zM4 10h16M4 14.5h16M10 5v14",
   code: "M6 3h8l4 4v14H6zM14 3v4h4M10.5 12L8.5 14.5l2 2.5M13.5 12l2 2.5-2 2.5",

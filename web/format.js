@@ -47,7 +47,7 @@ export function shownSize(bytes) {
     return "";
   }
   if (bytes < 1000) {
-    return t("bytes", { n: bytes });
+    return bytes === 1 ? t("oneByte") : t("bytes", { n: bytes });
   }
   let value = bytes / 1000;
   let unit = 0;

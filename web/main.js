@@ -55,6 +55,7 @@ class Page {
   }
 
   build(root) {
+    this.heading = h("h1", { class: "unseen" });
     this.crumbs = h("nav", { class: "crumbs", "aria-label": t("breadcrumbs") });
     this.search = h("input", { type: "search", class: "search", placeholder: t("search"),
                                "aria-label": t("search"), spellcheck: "false",
@@ -84,7 +85,7 @@ class Page {
                              ondragover: (event) => this.draggedOver(event),
                              ondragleave: () => main.classList.remove("drop"),
                              ondrop: (event) => this.droppedHere(event) },
-      this.refusal, this.view.element, this.state);
+      this.heading, this.refusal, this.view.element, this.state);
     this.main = main;
     this.showMode();
     root.replaceChildren(this.sidebar.element,
@@ -98,6 +99,7 @@ class Page {
   start() {
     this.go();
     this.refreshSidebar();
+    itemOf(ROOT).then(({ path }) => { this.details.rootPath = path; }, tellError);
     listen((message) => this.heard(message));
   }
 
@@ -189,6 +191,7 @@ class Page {
     this.shownFolder = this.folder;
     document.title = this.title === "" ? "Marrowdale" : `${this.title} – Marrowdale`;
     this.view.element.setAttribute("aria-label", this.title || t("content"));
+    this.heading.textContent = this.title || t("content");
     this.sidebar.show(key);
     if (kind !== "search" && document.activeElement !== this.search) {
       this.search.value = "";
@@ -316,10 +319,7 @@ class Page {
 
   showState() {
     const { listing } = this;
-    const count = listing.items.length;
-    const isShown = count > 0;
-    this.view.element.hidden = !isShown && listing.state !== "loading" || listing.state === "gone" ||
-      listing.state === "error";
+    this.view.element.hidden = listing.state === "gone" || listing.state === "error";
     const content = this.stateContent();
     this.state.hidden = content === null;
     this.state.replaceChildren(...(content ?? []));
@@ -654,14 +654,10 @@ class Page {
     const [kind, value] = [place.slice(0, place.indexOf("/")), place.slice(place.indexOf("/") + 1)];
     if (this.carriesFiles(event)) {
       if (kind === "folder") {
-        const { dataTransfer } = event;
-        const entries = { items: [...dataTransfer.items].map((each) => {
-          const entry = each.webkitGetAsEntry();
-          return { webkitGetAsEntry: () => entry };
-        }) };
+        const dropped = Uploads.take(event.dataTransfer);
         const folder = await itemOf(value);
         if (folder.capabilities & CAN.write) {
-          await this.uploads.addDropped(entries, folder).catch(tellError);
+          await this.uploads.addTaken(dropped, folder).catch(tellError);
         } else {
           explain(t("refusedTitle"), t(value === ROOT ? "refusedTop" : "refusedHere"));
         }

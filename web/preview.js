@@ -59,7 +59,7 @@ export function preview(items, index, { moved, open, download }) {
   let loading = new AbortController();
   const title = h("bdi", {});
   const facts = h("span", { class: "hint" });
-  const place = h("div", { class: "preview-content" });
+  const place = h("div", { class: "preview-content", tabindex: "-1" });
   const element = h("dialog", {
     class: "preview", "aria-labelledby": "preview-title",
     onclose: () => {
@@ -116,5 +116,6 @@ export function preview(items, index, { moved, open, download }) {
   }
   document.body.append(element);
   element.showModal();
+  place.focus();
   show();
 }

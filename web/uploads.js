@@ -41,9 +41,22 @@ export class Uploads {
 
   // Files and entries of folders as a drop brings them, or a field with files.
   async addDropped(transfer, folder) {
-    const entries = [...transfer.items].map((item) => item.webkitGetAsEntry?.()).filter(Boolean);
-    for (const entry of entries) {
-      await this.addEntry(entry, folder);
+    await this.addTaken(Uploads.take(transfer), folder);
+  }
+
+  // What a drop brings, to be asked for at once: afterwards the web browser tells nothing any more.
+  static take(transfer) {
+    return [...transfer.items].filter((item) => item.kind === "file")
+      .map((item) => ({ entry: item.webkitGetAsEntry?.(), file: item.getAsFile?.() }));
+  }
+
+  async addTaken(dropped, folder) {
+    for (const { entry, file } of dropped) {
+      if (entry) {
+        await this.addEntry(entry, folder);
+      } else if (file) {
+        this.add(file, folder);
+      }
     }
   }
 

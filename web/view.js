@@ -35,8 +35,8 @@ export class View extends EventTarget {
 
   build() {
     this.sizer = h("div", { class: "sizer", role: "presentation" });
-    this.grid = h("div", { class: "items", role: "grid", tabindex: "0",
-                           "aria-multiselectable": "true", "aria-label": t("content"),
+    this.grid = h("div", { class: "items", role: "group", tabindex: "0",
+                           "aria-label": t("content"),
                            onkeydown: (event) => this.pressed(event),
                            onscroll: () => this.render(),
                            onclick: (event) => this.clicked(event),
@@ -129,6 +129,10 @@ export class View extends EventTarget {
       this.current = this.items[at]?.itemIdentifier ?? null;
       this.pivot = this.current;
     }
+    if (!this.current && document.activeElement === this.grid) {
+      this.current = this.items[0]?.itemIdentifier ?? null;
+      this.pivot = this.current;
+    }
     this.currentIndex = this.current ? this.listing.indexOf(this.current) : 0;
   }
 
@@ -153,10 +157,9 @@ export class View extends EventTarget {
     const columns = this.columns;
     const rowCount = Math.ceil(this.items.length / columns);
     this.topKnown = this.items;
-    this.header.hidden = this.mode !== "list";
+    this.header.hidden = this.mode !== "list" || rowCount === 0;
     this.grid.classList.toggle("tiles", this.mode === "grid");
-    this.grid.setAttribute("aria-rowcount", rowCount + (this.mode === "list" ? 1 : 0));
-    this.grid.setAttribute("aria-colcount", this.mode === "list" ? COLUMNS.length : columns);
+    this.describeGrid(rowCount, columns);
     this.sizer.style.height = `${rowCount * this.rowHeight}px`;
     const first = Math.max(0, Math.floor(this.grid.scrollTop / this.rowHeight) - BEYOND);
     const last = Math.min(rowCount, Math.ceil(
@@ -179,6 +182,21 @@ export class View extends EventTarget {
     }
     this.markCurrent();
     this.markOrder();
+  }
+
+  // What has no rows is no grid.
+  describeGrid(rowCount, columns) {
+    const described = rowCount === 0 ? { role: "group" } : {
+      role: "grid", "aria-multiselectable": "true",
+      "aria-rowcount": rowCount + (this.mode === "list" ? 1 : 0),
+      "aria-colcount": this.mode === "list" ? COLUMNS.length : columns };
+    for (const name of ["role", "aria-multiselectable", "aria-rowcount", "aria-colcount"]) {
+      if (name in described) {
+        this.grid.setAttribute(name, described[name]);
+      } else {
+        this.grid.removeAttribute(name);
+      }
+    }
   }
 
   // A row whose name is being typed stays, even when there is news of its item.
@@ -468,7 +486,7 @@ export class View extends EventTarget {
       } else {
         this.delegate.preview();
       }
-    } else if (event.key.length === 1 && !event.ctrlKey && !event.metaKey) {
+    } else if (event.key.length === 1 && event.key !== "/" && !event.ctrlKey && !event.metaKey) {
       this.typeAhead(event.key);
     }
   }
