@@ -532,7 +532,7 @@ class Page {
       { label: t("uploadFiles"), icon: "upload", reason, act: () => this.files.click() },
       { label: t("uploadFolder"), reason, act: () => this.directories.click() },
       null,
-      { label: t("selectAll"), keys: "Ctrl A", act: () => this.view.selectAll() },
+      { label: t("selectAll"), keys: t("keyAll"), act: () => this.view.selectAll() },
       isTrash ? { label: t("emptyTrash"), icon: "trash", act: () => this.actions.emptyTrash() }
         : undefined].filter((entry) => entry !== undefined);
   }
@@ -544,7 +544,7 @@ class Page {
     const isFavorite = items.every((each) => each.favoriteRank !== undefined);
     const some = [
       isOne ? { label: t("open"), icon: "chevron", keys: "Enter", act: () => this.open(item) } : undefined,
-      isOne && isPreviewed(item) ? { label: t("preview"), icon: "image", keys: "Space",
+      isOne && isPreviewed(item) ? { label: t("preview"), icon: "image", keys: t("keySpace"),
                                      act: () => this.preview(item) } : undefined,
       items.some((each) => !each.isFolder)
         ? { label: t("download"), icon: "download", act: () => this.actions.download(items) } : undefined,
@@ -558,7 +558,7 @@ class Page {
         act: () => this.actions.setFavorite(items, !isFavorite) },
       isOne ? { label: t("copyAddress"), act: () => this.actions.copyAddress(item) } : undefined,
       null,
-      { label: t("moveToTrash"), icon: "trash", keys: "Del", reason: unless(CAN.trash),
+      { label: t("moveToTrash"), icon: "trash", keys: t("keyDelete"), reason: unless(CAN.trash),
         act: () => this.actions.trash(items) }];
     return some.filter((entry) => entry !== undefined);
   }
@@ -568,7 +568,7 @@ class Page {
       { label: t("putBack"), icon: "undo", act: () => this.actions.putBack(items) },
       { label: t("moveTo"), icon: "folder", act: () => this.actions.chooseAndMove(items) },
       null,
-      { label: t("deleteForGood"), keys: "Del", act: () => this.actions.deleteForGood(items) },
+      { label: t("deleteForGood"), keys: t("keyDelete"), act: () => this.actions.deleteForGood(items) },
       { label: t("emptyTrash"), icon: "trash", act: () => this.actions.emptyTrash() }];
   }
 

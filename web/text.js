@@ -71,7 +71,7 @@ const ENGLISH = {
   menu: "Places", dragging: "{n} items", ascending: "ascending", descending: "descending",
   previous: "Previous", next: "Next", settings: "Connections",
   dropRefused: "Nothing can be moved here", copyOf: "{base} {n}{extension}",
-  itemsShown: "{n} items shown", sortedBy: "Sorted by {key}, {order}", favorite: "favourite",
+  itemsShown: "{n} items shown", sortedBy: "Sorted by {key}, {order}", favorite: "favourite", keySpace: "Space", keyDelete: "Del", keyAll: "Ctrl A",
 };
 
 const GERMAN = {
@@ -155,7 +155,7 @@ const GERMAN = {
   menu: "Orte", dragging: "{n} Objekte", ascending: "aufsteigend", descending: "absteigend",
   previous: "Zurück", next: "Weiter", settings: "Verbindungen",
   dropRefused: "Hierher lässt sich nichts verschieben", copyOf: "{base} {n}{extension}",
-  itemsShown: "{n} Objekte", sortedBy: "Sortiert nach {key}, {order}", favorite: "Favorit",
+  itemsShown: "{n} Objekte", sortedBy: "Sortiert nach {key}, {order}", favorite: "Favorit", keySpace: "Leertaste", keyDelete: "Entf", keyAll: "Strg A",
 };
 
 export const language = navigator.language.startsWith("de") ? navigator.language : "en-GB";
