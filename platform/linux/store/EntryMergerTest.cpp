@@ -48,7 +48,8 @@ TEST(EntryMergerTest, AFileWhoseNumberIsAnothersNowHasLeft) {
     const PackageTypes packages;
     Index index;
     TreeChanges changes(index, packages);
-    SafeSaves saves(index, changes);
+    OwnMoves own;
+    SafeSaves saves(index, changes, own);
     EntryMerger merger(index, changes, saves);
     EntryLook root = lookAt(folderMode);
     root.status.fileID = FileID{2};

@@ -96,6 +96,7 @@ void SafeSaves::add(TreeChanges::Departure departure, Clock::time_point now,
     vacancy.file = departure.file;
     vacancy.isFolder = departure.isFolder;
     vacancy.since = now;
+    vacancy.isOwn = own_.takeLeaving({vacancy.folder, vacancy.name, vacancy.file});
     vacancy.wasRenamed = renamedAway_.contains({vacancy.folder, vacancy.name});
     vacancy.birth = departure.birth;
     vacancy.fingerprint = departure.fingerprint;
@@ -187,7 +188,8 @@ SafeSaves::Fate SafeSaves::fateOf(Vacancy& vacancy, RowNumber taker, RowNumber o
     if (index_.row(taker).isFolder() != vacancy.isFolder) {
         return Fate::forget;
     }
-    if (vacancy.taken.how == Arrival::movedIn) {
+    if (vacancy.taken.how == Arrival::movedIn || vacancy.isOwn ||
+        own_.hasArrived({vacancy.folder, vacancy.name, FileID{index_.row(taker).fileID}})) {
         return Fate::forget;
     }
     return old != noRow ? fateWhenThere(vacancy, taker, old, knowledge)

@@ -12,6 +12,7 @@
 
 #include "platform/foundation/Identifiers.h"
 #include "platform/linux/store/Index.h"
+#include "platform/linux/store/OwnMoves.h"
 #include "platform/linux/store/TreeChanges.h"
 
 namespace marrowdale::native {
@@ -27,8 +28,9 @@ namespace marrowdale::native {
 //   another file, and the earlier one is nowhere, or stands under a back-up's name and went there
 //   within 15 seconds of the new one's birth.
 //
-// Never across folders, and never for a file that is newly made where one was unlinked. A document
-// whose file turns up again within 15 seconds of its going has its identifier back.
+// Never across folders, never for a file that is newly made where one was unlinked, and never where
+// the file left, or the other came, by our own doing (OwnMoves). A document whose file turns up
+// again within 15 seconds of its going has its identifier back.
 //
 // One thread at a time, as the index.
 class SafeSaves {
@@ -54,7 +56,8 @@ class SafeSaves {
         CarriedAttributes attributes;  // of the earlier file
     };
 
-    SafeSaves(Index& index, TreeChanges& changes) : index_(index), changes_(changes) {}
+    SafeSaves(Index& index, TreeChanges& changes, OwnMoves& own)
+        : index_(index), changes_(changes), own_(own) {}
 
     // What a hint told of a name; `fromName` with renamedWithin. The last word on a name counts,
     // but being made is no news of one that was renamed there.
@@ -87,6 +90,7 @@ class SafeSaves {
         Clock::time_point since;
         CarriedAttributes attributes;
         bool wasRenamed = false;  // and not unlinked at once
+        bool isOwn = false;       // the file left by our own doing
         Came taken;
     };
     enum class Fate : std::uint8_t { wait, forget, transfer, exchange };
@@ -115,6 +119,7 @@ class SafeSaves {
 
     Index& index_;
     TreeChanges& changes_;
+    OwnMoves& own_;
     std::map<Name, Came> arrivals_;
     std::set<Name> renamedAway_;
     std::map<Number, Vacancy> vacancies_;

@@ -68,9 +68,46 @@ class SafeSavesTest : public testing::Test {
     Index index_;
     PackageTypes packages_;
     TreeChanges changes_{index_, packages_};
-    SafeSaves saves_{index_, changes_};
+    OwnMoves own_;
+    SafeSaves saves_{index_, changes_, own_};
     EntryMerger merger_{index_, changes_, saves_};
 };
+
+TEST_F(SafeSavesTest, WhatLeftByOurOwnDoingWasNotSaved) {
+    OwnMoves::Note removal(&own_, OwnMoves::Kind::isRemoved, {folder, "doc", FileID{10}});
+    removal.wasDone();
+    vanish("doc");
+    EXPECT_TRUE(settleAt(std::chrono::seconds(100)).empty());
+    appear("doc", 11);
+    arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+    EXPECT_TRUE(settleAt(std::chrono::seconds(101)).empty());
+    EXPECT_EQ(documentAt("doc"), 0U);
+    EXPECT_FALSE(own_.hasRemovals());
+}
+
+TEST_F(SafeSavesTest, WhatCameByOurOwnDoingSavesNothing) {
+    vanish("doc");
+    EXPECT_TRUE(settleAt(std::chrono::seconds(100)).empty());
+    OwnMoves::Note arrival(&own_, OwnMoves::Kind::arrives, {folder, "doc", FileID{11}});
+    arrival.wasDone();
+    appear("doc", 11);
+    arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+    EXPECT_TRUE(settleAt(std::chrono::seconds(101)).empty());
+}
+
+TEST_F(SafeSavesTest, WhatWasNotDoneAfterAllIsNoReason) {
+    {
+        const OwnMoves::Note refused(&own_, OwnMoves::Kind::leaves, {folder, "doc", FileID{10}});
+    }
+    {
+        const OwnMoves::Note refused(&own_, OwnMoves::Kind::arrives, {folder, "doc", FileID{11}});
+    }
+    vanish("doc");
+    EXPECT_TRUE(settleAt(std::chrono::seconds(100)).empty());
+    appear("doc", 11);
+    arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+    EXPECT_EQ(settleAt(std::chrono::seconds(101)).size(), 1U);
+}
 
 TEST_F(SafeSavesTest, AFileRenamedOntoAnUnlinkedNameInTime) {
     vanish("doc");

@@ -29,6 +29,10 @@ StoreReport Store::report() const {
     return core_->report();
 }
 
+OwnMoves& Store::ownMoves() {
+    return core_->ownMoves();
+}
+
 Expected<FileID> Store::resolveDocumentID(DocumentID document, DeviceID device) {
     return core_->resolveDocumentID(document, device);
 }

@@ -7,6 +7,7 @@
 
 #include "platform/linux/files/DocumentIndex.h"
 #include "platform/linux/store/EventHistory.h"
+#include "platform/linux/store/OwnMoves.h"
 #include "platform/linux/store/StoreOptions.h"
 #include "platform/linux/store/StoreReport.h"
 #include "platform/services/GenerationStore.h"
@@ -62,6 +63,9 @@ class Store final : public GenerationStore, public EventHistory, public Document
     [[nodiscard]] Expected<void> setLibraries(std::vector<LibraryFolder> libraries);
 
     [[nodiscard]] StoreReport report() const;
+
+    // To be told of what this system itself moves and removes below the roots.
+    [[nodiscard]] OwnMoves& ownMoves();
 
     // GenerationStore. Documents of names that are gone are looked for once (a reconcile) before
     // the answer is ENOENT; another volume is ENXIO.

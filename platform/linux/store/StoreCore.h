@@ -21,6 +21,7 @@
 #include "platform/linux/store/Mutex.h"
 #include "platform/linux/store/Reconciler.h"
 #include "platform/linux/store/RecordedRoots.h"
+#include "platform/linux/store/OwnMoves.h"
 #include "platform/linux/store/SafeSaves.h"
 #include "platform/linux/store/StateFolder.h"
 #include "platform/linux/store/Store.h"
@@ -62,6 +63,7 @@ class Store::Core {
         MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] std::vector<EventRoot> eventRoots() const;
     [[nodiscard]] DeviceID device() const { return device_; }
+    [[nodiscard]] OwnMoves& ownMoves() { return own_; }
     [[nodiscard]] std::uint64_t addListener(std::function<void(EventHistory::News)> listener)
         MARROWDALE_EXCLUDES(listenersMutex_);
     void removeListener(std::uint64_t number) MARROWDALE_EXCLUDES(listenersMutex_);
@@ -235,6 +237,7 @@ class Store::Core {
     const PackageTypes packages_;
     AttributeCarrier carrier_;
 
+    OwnMoves own_;
     Mutex mutex_;
     std::vector<WantedLibrary> wanted_ MARROWDALE_GUARDED_BY(mutex_);
     bool wantedChanged_ MARROWDALE_GUARDED_BY(mutex_) = true;  // since a pass looked

@@ -37,7 +37,7 @@ Store::Core::Core(const StoreOptions& options, StateFolder state, StoreFolder fo
       carrier_(options.carriedAttributePrefix),
       wanted_(wantedLibraries(options.libraries, options.rootPath)),
       changes_(index_, packages_),
-      saves_(index_, changes_),
+      saves_(index_, changes_, own_),
       recording_(options.recording),
       watcherKind_(options.watcher) {}
 

@@ -460,7 +460,8 @@ void Store::Core::finishUpdates() {
         const MutexLock lock(mutex_);
         isNeeded = journal_ && watches_ && index_.hasLimbo();
     }
-    if (isNeeded || watcher_) {
+    // The next process would not know any more that a removal was ours.
+    if (isNeeded || watcher_ || own_.hasRemovals()) {
         if (auto done = lookForMissing(); !done) {
             log("the last changes could not be looked at: " + done.error().description());
         }
