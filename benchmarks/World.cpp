@@ -128,7 +128,11 @@ class World::Parts {
     native::LinuxExtendedAttributes extendedAttributes{attributeCalls, trees};
     native::LinuxWriteAccess writeAccess{trees};
     std::unique_ptr<native::Temporaries> temporaries;
-    native::LinuxFileOperations fileOperations{{trees, packages, *temporaries}, &log};
+    native::LinuxFileOperations fileOperations{{.trees = trees,
+                                                .packages = packages,
+                                                .temporaries = *temporaries,
+                                                .ownMoves = &store->ownMoves()},
+                                               &log};
     Manager manager;
     SharedObjects shared;
     native::LinuxApplicationSupport applicationSupport;

@@ -65,7 +65,10 @@ class FileOperations {
     // The same for any folder.
     virtual void moveIntoFolderAvoidingCollision(const URL& item, const URL& folder,
                                                  URLHandler handler) = 0;
-    // A folder with its contents: it goes from its place at once, and then from the disk.
+    // A folder with its contents: it goes from its place at once, and then from the disk. Where the
+    // file system can't do that, or is full, it is taken apart in its place. A URL that knows its
+    // file (ResourceKey::fileID is cached on it) means that file alone: ENOENT where another has
+    // the name by now.
     virtual void deleteItemAtURL(const URL& item, ErrorHandler handler) = 0;
 };
 

@@ -10,9 +10,10 @@ namespace marrowdale {
 // be mounted: only root may.
 class ScopedMount {
   public:
-    // A fresh, empty file system in memory.
-    [[nodiscard]] static ScopedMount memory(const std::string& target) {
-        return {::mount("none", target.c_str(), "tmpfs", 0, nullptr), target};
+    // A fresh, empty file system in memory; `options` as mount(8) has them ("size=1m").
+    [[nodiscard]] static ScopedMount memory(const std::string& target,
+                                            const char* options = nullptr) {
+        return {::mount("none", target.c_str(), "tmpfs", 0, options), target};
     }
     [[nodiscard]] static ScopedMount bind(const std::string& source, const std::string& target) {
         return {::mount(source.c_str(), target.c_str(), nullptr, MS_BIND, nullptr), target};

@@ -90,7 +90,11 @@ class TestWorld {
     native::PNGEncoder imageEncoder;
 
   private:
-    native::LinuxFileOperations realFileOperations_{{trees, packages_, *temporaries}, &log};
+    native::LinuxFileOperations realFileOperations_{{.trees = trees,
+                                                     .packages = packages_,
+                                                     .temporaries = *temporaries,
+                                                     .ownMoves = &store->ownMoves()},
+                                                    &log};
 
   public:
     FaultInjectingFileOperations fileOperations{realFileOperations_};

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "platform/linux/files/DirectoryReader.h"
+#include "platform/linux/operations/MoveNotes.h"
 #include "platform/linux/operations/TreeRemoval.h"
 #include "platform/services/FileOperations.h"
 
@@ -57,8 +58,19 @@ Expected<std::set<std::string, std::less<>>> namesBeginning(const WorkFolder& fo
     }
 }
 
+bool isFull(const Error& error) {
+    return error.code == ENOSPC || error.code == EDQUOT;
+}
+
 bool isSame(const EntryStatus& a, const EntryStatus& b) {
     return a.fileID == b.fileID && a.device == b.device;
+}
+
+// Whether what stands there is the file that the URL was made for, where it says which.
+bool isMeant(const URL& url, const EntryStatus& status) {
+    const auto value = url.cachedResourceValue(ResourceKey::fileID);
+    const auto* number = value ? std::get_if<Number>(&*value) : nullptr;
+    return number == nullptr || *number == Number(raw(status.fileID));
 }
 
 }  // namespace
@@ -109,9 +121,13 @@ Expected<URL> FileWork::move(const URL& item, const URL& folder,
 Expected<URL> FileWork::moveTo(const WorkItem& item, const WorkFolder& folder,
                                const std::string& name, std::string_view operation) const {
     URL moved = folder.child(name);
+    auto leaving = noteLeaving(parts_.ownMoves, OwnMoves::Kind::leaves, item);
+    auto arrival = noteArrival(parts_.ownMoves, item.status.fileID, folder.get(), name);
     const auto done = moveWithoutReplacing(item.folder(), item.name(), folder.get(), name.c_str(),
                                            parts_.noReplace);
     if (done) {
+        leaving.wasDone();
+        arrival.wasDone();
         return moved;
     }
     if (!isTaken(done.error())) {
@@ -177,37 +193,54 @@ Expected<void> FileWork::remove(const URL& item, OperationRun& run) const {
     if (!found) {
         return Unexpected(found.error());
     }
+    if (!isMeant(item, found->status)) {
+        return Unexpected(errorWithPOSIXCode(ENOENT, removing, item.path()));
+    }
     if (auto checked = run.checkpoint(removing, item.path()); !checked) {
         return checked;
     }
-    const bool isFolder = found->status.isDirectory();
-    if (::unlinkat(found->folder(), found->name(), isFolder ? AT_REMOVEDIR : 0) == 0) {
-        return {};
+    auto note = noteLeaving(parts_.ownMoves, OwnMoves::Kind::isRemoved, *found);
+    auto removed = removeApart(*found, run);
+    if (removed) {
+        note.wasDone();
     }
-    const int code = errno;
-    if (isFolder && (code == ENOTEMPTY || code == EEXIST)) {
-        return removeFolder(*found, run);
-    }
-    return Unexpected(errorWithPOSIXCode(code, removing, item.path()));
+    return removed;
 }
 
-// The folder leaves its place whole, in one step, and is taken apart where nobody looks.
-Expected<void> FileWork::removeFolder(const WorkItem& item, OperationRun& run) const {
+// It leaves its place whole, in one step, and goes where nobody looks: a name may be another
+// file's by the time that it is removed.
+Expected<void> FileWork::removeApart(const WorkItem& item, OperationRun& run) const {
+    const bool isFolder = item.status.isDirectory();
+    if (isFolder && ::unlinkat(item.folder(), item.name(), AT_REMOVEDIR) == 0) {
+        return {};  // it was empty
+    }
     const auto folder = folderOf(item);
     if (!folder) {
         return Unexpected(folder.error());
     }
-    const auto temporary = parts_.temporaries.make(folder->get(), folder->url.path());
+    // What a cut of the power leaves of a file was to be removed anyway.
+    const auto temporary = parts_.temporaries.make(
+        folder->get(), folder->url.path(),
+        isFolder ? Temporaries::Noting::synced : Temporaries::Noting::unsynced);
     if (!temporary) {
-        return Unexpected(temporary.error());
+        // Where there is no room to take it apart in, removing it in its place makes some.
+        return isFull(temporary.error()) ? removeInPlace(item, run)
+                                         : Unexpected(errorWithPOSIXCode(
+                                               temporary.error().code, removing, item.url.path()));
     }
     const auto apart = moveWithoutReplacing(item.folder(), item.name(), temporary->descriptor(),
                                             item.name(), parts_.noReplace);
     if (!apart) {
         // Where folders can't be moved it is taken apart in its place.
-        return apart.error().code == ENOTSUP
-                   ? removeTree(item.folder(), item.name(), item.url.path(), run)
+        return apart.error().code == ENOTSUP || apart.error().code == EXDEV
+                   ? removeInPlace(item, run)
                    : Unexpected(errorWithPOSIXCode(apart.error().code, removing, item.url.path()));
+    }
+    const auto taken = statEntry(temporary->descriptor(), item.name());
+    if (taken && !isSame(*taken, item.status)) {
+        const auto back = bringBack(item, temporary->descriptor(), *folder);
+        return Unexpected(
+            errorWithPOSIXCode(back ? ENOENT : back.error().code, removing, item.url.path()));
     }
     run.passPointOfNoReturn();
     auto removed = removeTree(temporary->descriptor(), item.name(), item.url.path(), run);
@@ -215,16 +248,27 @@ Expected<void> FileWork::removeFolder(const WorkItem& item, OperationRun& run) c
         return {};  // gone from its place; the rest is swept at the next start
     }
     // What can't be removed must not stay hidden.
+    const auto back = bringBack(item, temporary->descriptor(), *folder);
+    return back ? std::move(removed) : back;
+}
+
+Expected<void> FileWork::bringBack(const WorkItem& item, int from, const WorkFolder& folder) const {
     const std::string name = item.name();
+    const NumberPlace place = numberPlace(name, item.status);
     for (std::uint64_t number = 1;; ++number) {
-        const std::string next =
-            number == 1 ? name : numberedName(name, number, numberPlace(name, item.status));
-        const auto back = moveWithoutReplacing(temporary->descriptor(), item.name(), folder->get(),
-                                               next.c_str(), parts_.noReplace);
+        const std::string next = number == 1 ? name : numberedName(name, number, place);
+        auto back =
+            moveWithoutReplacing(from, item.name(), folder.get(), next.c_str(), parts_.noReplace);
         if (back || !isTaken(back.error())) {
-            return removed;
+            return back;
         }
     }
+}
+
+// Seen half gone by others, and by the next start if the process ends in between.
+Expected<void> FileWork::removeInPlace(const WorkItem& item, OperationRun& run) {
+    run.passPointOfNoReturn();
+    return removeTree(item.folder(), item.name(), item.url.path(), run);
 }
 
 }  // namespace marrowdale::native

@@ -14,6 +14,7 @@
 #include "platform/linux/operations/OperationRun.h"
 #include "platform/linux/operations/Temporaries.h"
 #include "platform/linux/operations/WorkPlaces.h"
+#include "platform/linux/store/OwnMoves.h"
 
 namespace marrowdale::native {
 
@@ -30,6 +31,7 @@ struct FileWorkParts {
     Temporaries& temporaries;
     NoReplaceMethod noReplace = NoReplaceMethod::rename;
     ImportMethod importing = ImportMethod::unnamedFile;
+    OwnMoves* ownMoves = nullptr;  // who is told of moves and removals; null for nobody
 };
 
 // The file work itself, on the caller's thread; what each does is told by FileOperations. Any
@@ -59,7 +61,10 @@ class FileWork {
                                                     const WorkFolder& folder,
                                                     const std::string& name,
                                                     OperationRun& run) const;
-    [[nodiscard]] Expected<void> removeFolder(const WorkItem& item, OperationRun& run) const;
+    [[nodiscard]] Expected<void> removeApart(const WorkItem& item, OperationRun& run) const;
+    [[nodiscard]] Expected<void> bringBack(const WorkItem& item, int from,
+                                           const WorkFolder& folder) const;
+    [[nodiscard]] static Expected<void> removeInPlace(const WorkItem& item, OperationRun& run);
 
     FileWorkParts parts_;
 };

@@ -7,6 +7,7 @@
 
 #include "platform/linux/operations/FileCopy.h"
 #include "platform/linux/operations/FileWork.h"
+#include "platform/linux/operations/MoveNotes.h"
 #include "platform/linux/operations/TreeCopy.h"
 #include "platform/services/FileOperations.h"
 
@@ -97,9 +98,13 @@ Expected<URL> FileWork::importFile(const WorkItem& source, const WorkFolder& fol
         return Unexpected(done.error());
     }
     URL imported = folder.child(name);
+    const auto made = statEntry(target.get(), "");
+    auto arrival = noteArrival(made ? parts_.ownMoves : nullptr, made ? made->fileID : FileID{},
+                               folder.get(), name);
     if (const auto named = nameUnnamed(target.get(), folder.get(), name.c_str()); !named) {
         return Unexpected(importError(named.error().code, source, imported));
     }
+    arrival.wasDone();
     run.didEntry();
     return imported;
 }

@@ -43,6 +43,21 @@ TEST_P(RemovalTest, filesLinksPipesAndFoldersGo) {
     EXPECT_EQ(world_.remove("")->code, EBUSY);
 }
 
+TEST_P(RemovalTest, whatTookTheNameSinceStays) {
+    writeFile(world_.at("a"), "a");
+    writeFile(world_.at("b"), "b");
+    const URL meant = world_.url("a");
+    const auto status = statEntry(AT_FDCWD, world_.at("a").c_str());
+    ASSERT_TRUE(status);
+    meant.setCachedResourceValue(ResourceKey::fileID, Number(raw(status->fileID)));
+    std::filesystem::rename(world_.at("b"), world_.at("a"));
+    std::promise<std::optional<Error>> answer;
+    world_.operations.deleteItemAtURL(
+        meant, [&](const std::optional<Error>& error) { answer.set_value(error); });
+    EXPECT_EQ(answer.get_future().get().value_or(Error()).code, ENOENT);
+    EXPECT_EQ(readFile(world_.at("a")), "b");
+}
+
 TEST_P(RemovalTest, linksOutOfATreeAreNotFollowed) {
     makeFolder(world_.outside("folder"));
     writeFile(world_.outside("folder/file"), "kept");

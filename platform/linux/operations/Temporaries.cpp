@@ -163,7 +163,9 @@ void Temporaries::tell(const Error& error) const {
     }
 }
 
-Expected<void> Temporaries::note(const UUID& id, int folder, const std::string& path) const {
+Expected<void> Temporaries::note(const UUID& id, int folder, const std::string& path,
+                                 Noting noting) const {
+    const bool isSynced = noting == Noting::synced;
     const auto status = statEntry(folder, "");
     if (!status) {
         return Unexpected(status.error());
@@ -172,13 +174,13 @@ Expected<void> Temporaries::note(const UUID& id, int folder, const std::string& 
     const std::string fresh = noteOf(id) + std::string(unfinished);
     const auto file = DiskFile::open(fresh, O_WRONLY | O_CREAT | O_EXCL);
     auto done = file ? file->write(bytes, 0) : Unexpected(file.error());
-    if (done) {
+    if (done && isSynced) {
         done = file->sync();
     }
     if (done) {
         done = renameFile(fresh, noteOf(id));
     }
-    if (done) {
+    if (done && isSynced) {
         done = syncFolder(notes_);
     }
     if (!done && file) {
@@ -188,20 +190,23 @@ Expected<void> Temporaries::note(const UUID& id, int folder, const std::string& 
     return done;
 }
 
-Expected<Temporaries::Folder> Temporaries::make(int folder, const std::string& path) {
+Expected<Temporaries::Folder> Temporaries::make(int folder, const std::string& path,
+                                                Noting noting) {
     const UUID id = UUID::random();
     UniqueFD in(::openat(folder, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (!in) {
         return Unexpected(errorWithPOSIXCode(errno, "make a temporary folder in", path));
     }
-    if (const auto noted = note(id, folder, path); !noted) {
+    if (const auto noted = note(id, folder, path, noting); !noted) {
         return Unexpected(noted.error());
     }
     const std::string name = nameOf(id);
-    Folder made(this, std::move(in), path, id);
     if (::mkdirat(folder, name.c_str(), 0700) != 0) {
-        return Unexpected(errorWithPOSIXCode(errno, "make a temporary folder in", path));
+        const int code = errno;
+        forget(id);
+        return Unexpected(errorWithPOSIXCode(code, "make a temporary folder in", path));
     }
+    Folder made(this, std::move(in), path, id);
     auto opened = openFolderBeneath(folder, name);
     if (!opened) {
         return Unexpected(opened.error());

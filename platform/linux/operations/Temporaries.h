@@ -1,6 +1,7 @@
 #pragma once
 
 #include <atomic>
+#include <cstdint>
 #include <functional>
 #include <memory>
 #include <string>
@@ -53,9 +54,12 @@ class Temporaries {
         UUID id_;
         UniqueFD descriptor_;
     };
+    // How a folder is noted: for a cut of the power as well, or for the end of the process alone.
+    enum class Noting : std::uint8_t { synced, unsynced };
     // Makes one (mode 0700) in the open folder, which is at `path`. Errors: POSIX, those of the
     // state folder among them.
-    [[nodiscard]] Expected<Folder> make(int folder, const std::string& path);
+    [[nodiscard]] Expected<Folder> make(int folder, const std::string& path,
+                                        Noting noting = Noting::synced);
 
     // Makes removals end at their next checkpoint; what they leave is swept at the next start.
     void stop() { stopping_ = true; }
@@ -68,7 +72,8 @@ class Temporaries {
     Temporaries(std::string notes, Log* log) : notes_(std::move(notes)), log_(log) {}
 
     [[nodiscard]] std::string noteOf(const UUID& id) const { return notes_ + "/" + id.text(); }
-    [[nodiscard]] Expected<void> note(const UUID& id, int folder, const std::string& path) const;
+    [[nodiscard]] Expected<void> note(const UUID& id, int folder, const std::string& path,
+                                      Noting noting) const;
     void forget(const UUID& id) const;
     void sweepOne(const std::string& name, const FolderFinder& finder);
     [[nodiscard]] bool removeFrom(int folder, const std::string& path, const UUID& id) const;
