@@ -15,6 +15,14 @@ std::string quoted(std::string_view text) {
     return "\"" + std::string(text) + "\"";
 }
 
+// Whether what was found at the place of the one that was asked for has come there since. A file's
+// own number names it too, beside its document's, so only like is compared with like.
+bool isAnother(const LocalItem& item, std::string_view itemIdentifier) {
+    const std::string_view kind = itemIdentifier.substr(0, itemIdentifier.find('=') + 1);
+    return !kind.empty() && item.itemIdentifier.starts_with(kind) &&
+           item.itemIdentifier != itemIdentifier;
+}
+
 Expected<std::shared_ptr<LocalItem>> lookUpItem(const Platform& platform,
                                                 std::string_view itemIdentifier) {
     auto item = itemForIdentifierString(platform, itemIdentifier);
@@ -30,7 +38,7 @@ Expected<std::shared_ptr<LocalItem>> lookUpItem(const Platform& platform,
 
 Expected<URL> urlOfItem(const Platform& platform, std::string_view itemIdentifier) {
     const auto item = itemForIdentifierString(platform, itemIdentifier);
-    if (!item) {
+    if (!item || isAnother(*item, itemIdentifier)) {
         return Unexpected(errorForNonExistentItem(itemIdentifier));
     }
     platform.log.debug([&] { return "found " + std::string(itemIdentifier); });
