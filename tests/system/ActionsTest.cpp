@@ -1,5 +1,9 @@
 #include <filesystem>
+#include <optional>
+#include <tuple>
 
+#include "tests/system/ApplicationHome.h"
+#include "tests/system/Service.h"
 #include "tests/system/SystemTest.h"
 
 namespace marrowdale::tests {
@@ -7,16 +11,36 @@ namespace {
 
 namespace fs = std::filesystem;
 
-class ActionsTest : public SystemTest {
+// Who does the work: the command itself, or the service that it asks.
+enum class By : std::uint8_t { command, service };
+
+class ActionsTest : public ::testing::TestWithParam<std::tuple<TestFileSystem, By>> {
   protected:
-    void SetUp() override { makeFolder(home_.document("folder")); }
+    void SetUp() override {
+        makeFolder(home_.document("folder"));
+        if (std::get<1>(GetParam()) == By::service) {
+            serve();
+        }
+    }
+    void serve() { service_.emplace(home_); }
     [[nodiscard]] std::string made(const std::string& name, std::string_view contents = "x") {
         writeFile(home_.document(name), contents);
         return home_.identifierOf(name);
     }
+    ApplicationHome home_{std::get<0>(GetParam()).dir};
+
+  private:
+    std::optional<Service> service_;
 };
 
-MARROWDALE_ON_EACH_FILE_SYSTEM(ActionsTest);
+INSTANTIATE_TEST_SUITE_P(OnEach, ActionsTest,
+                         ::testing::Combine(::testing::ValuesIn(testFileSystems()),
+                                            ::testing::Values(By::command, By::service)),
+                         [](const auto& given) {
+                             return std::get<0>(given.param).name +
+                                    (std::get<1>(given.param) == By::service ? "_service"
+                                                                             : "_command");
+                         });
 
 TEST_P(ActionsTest, documentsComeMoveAndGo) {
     writeFile(home_.path("source.txt"), "text");
@@ -42,6 +66,15 @@ TEST_P(ActionsTest, aTakenNameIsTheItemInTheWay) {
     const Json error = home_.error({"rename", item, "b"}, 1);
     EXPECT_EQ(error["name"], "filenameCollision");
     EXPECT_EQ(error["item"]["itemIdentifier"], inTheWay);
+}
+
+TEST_P(ActionsTest, aNameThatADeletionFreedGoesToAnotherDocument) {
+    const std::string deleted = made("folder/a");
+    const std::string renamed = made("folder/b");
+    EXPECT_TRUE(home_.lines({"delete", deleted}).empty());
+    EXPECT_EQ(home_.line({"rename", renamed, "a"})["itemIdentifier"], renamed);
+    EXPECT_EQ(home_.identifierOf("folder/a"), renamed);
+    EXPECT_EQ(home_.error({"info", deleted}, 1)["name"], "noSuchItem");
 }
 
 TEST_P(ActionsTest, whatIsTrashedGoesBackWhereItWas) {
@@ -72,6 +105,24 @@ TEST_P(ActionsTest, theRootAllowsNothing) {
     }
     EXPECT_TRUE(fs::exists(home_.document("folder/a")));
     EXPECT_FALSE(fs::exists(home_.document("new")));
+}
+
+TEST_P(ActionsTest, anAppLibraryAllowsNothingButMetadataAndWhatItTakesIn) {
+    home_.install("org.example.Notes", "Notes");
+    writeFile(home_.library("org.example.Notes") + "/note", "note");
+    ASSERT_EQ(home_.run({"refresh"}).exitCode, 0);
+    const std::string library = "#org.example.Notes";
+    ASSERT_EQ(home_.line({"info", library})["itemIdentifier"], library);
+    for (const Arguments& arguments :
+         {Arguments{"delete", library}, Arguments{"trash", library},
+          Arguments{"rename", library, "x"},
+          Arguments{"move", library, "--to", home_.document("folder")}}) {
+        EXPECT_EQ(home_.error(arguments, 1)["name"], "writeNoPermission") << arguments.front();
+    }
+    EXPECT_EQ(readFile(home_.library("org.example.Notes") + "/note"), "note");
+    EXPECT_FALSE(fs::exists(home_.library("org.example.Notes") + "/.Trash"));
+    EXPECT_EQ(text(home_.line({"mkdir", "new", "--in", library}), "path"),
+              home_.library("org.example.Notes") + "/new");
 }
 
 TEST_P(ActionsTest, metadataIsSetAndCleared) {
@@ -122,6 +173,50 @@ TEST_P(ActionsTest, namesOfAnyBytesAreTaken) {
     const Json renamed = home_.line({"rename", item, "b\\udcff"});
     EXPECT_EQ(text(renamed, "filename"), "b\xff");
     EXPECT_TRUE(fs::exists(home_.document("folder/b\xff")));
+}
+
+// Whoever does the work, a refusal is told in the same words.
+class RefusedActionsTest : public SystemTest {};
+
+MARROWDALE_ON_EACH_FILE_SYSTEM(RefusedActionsTest);
+
+TEST_P(RefusedActionsTest, errorsAreTheSameWithAndWithoutAService) {
+    makeFolder(home_.document("folder/inner"));
+    writeFile(home_.document("folder/a"), "a");
+    writeFile(home_.document("folder/b"), "b");
+    writeFile(home_.path("b"), "outside");
+    const std::string item = home_.identifierOf("folder/a");
+    const std::string folder = home_.identifierOf("folder");
+    const std::string inner = home_.identifierOf("folder/inner");
+    const std::vector<Arguments> refused{{"delete", "root"},
+                                         {"trash", "root"},
+                                         {"delete", "#org.example.None"},
+                                         {"trash", "did=4294967295"},
+                                         {"rename", item, "b"},
+                                         {"rename", item, std::string(256, 'x')},
+                                         {"rename", item, "x/y"},
+                                         {"rename", "did=4294967295", "x"},
+                                         {"move", item, "--to", "root"},
+                                         {"move", item, "--to", folder, "--name", "b"},
+                                         {"move", folder, "--to", inner},
+                                         {"move", "did=4294967295", "--to", folder},
+                                         {"import", home_.path("b"), "--into", folder},
+                                         {"import", home_.path("none"), "--into", folder},
+                                         {"mkdir", "b", "--in", folder},
+                                         {"mkdir", "new", "--in", "root"},
+                                         {"untrash", item},
+                                         {"tag", "did=4294967295", "red"},
+                                         {"favorite", "did=4294967295", "1"},
+                                         {"used", "#org.example.None", "2026-01-31T00:00:00Z"}};
+    std::vector<Json> errors;
+    for (const Arguments& arguments : refused) {
+        errors.push_back(home_.error(arguments, 1));
+    }
+    const Service service(home_);
+    for (std::size_t i = 0; i < refused.size(); ++i) {
+        EXPECT_EQ(home_.error(refused[i], 1), errors[i]) << refused[i].front();
+    }
+    EXPECT_EQ(readFile(home_.document("folder/a")) + readFile(home_.document("folder/b")), "ab");
 }
 
 }  // namespace
