@@ -14,6 +14,8 @@ struct Suite {
     std::string folder;  // trees and state folders lie below it, on one file system
     Sizes sizes;
     Table table;
+    // On a file system whose files can share blocks; none where there is none.
+    std::optional<std::string> copyingFolder = std::nullopt;
 
     [[nodiscard]] Tree nestedTree(bool hasAttributes) const {
         return {folder + (hasAttributes ? "/nested-attributes" : "/nested"), sizes.folders,
@@ -46,6 +48,8 @@ void compareReplays(Suite& suite);
 void compareStoreSize(Suite& suite);
 void compareApplications(Suite& suite);
 void compareWatchman(Suite& suite);
+void compareImports(Suite& suite);
+void compareItemActions(Suite& suite);
 
 enum class MemoryOf { index, listing, recording };
 [[nodiscard]] std::optional<MemoryOf> memoryArgument(std::string_view argument);

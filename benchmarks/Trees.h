@@ -29,12 +29,16 @@ struct Sizes {
     std::uint64_t manyEvents;  // in a long history
     std::uint64_t fewEvents;   // in a short one
     std::uint64_t replayed;
+    std::uint64_t importBytes;
+    std::uint64_t smallFiles;  // imported at once
+    std::uint64_t actedOn;     // items, one after the other
     static constexpr Sizes full() {
-        return {1'000, 100'000, 10'000, 1'000'000,  20'000, 3,
-                10,    50'000,  200,    10'000'000, 10'000, 1'000'000};
+        return {1'000, 100'000,    10'000, 1'000'000, 20'000,      3,      10,   50'000,
+                200,   10'000'000, 10'000, 1'000'000, 1ULL << 30U, 10'000, 1'000};
     }
     static constexpr Sizes quick() {
-        return {20, 1'000, 50, 5'000, 500, 1, 2, 5'000, 20, 1'000'000, 10'000, 100'000};
+        return {20, 1'000,     50,     5'000,   500,          1,   2, 5'000,
+                20, 1'000'000, 10'000, 100'000, 16ULL << 20U, 200, 50};
     }
 };
 
