@@ -29,7 +29,7 @@ void moveBare(const std::string& from, const std::string& to) {
 class Items {
   public:
     Items(const std::string& folder, std::uint64_t count)
-        : root_(folder + "/items/tree"),
+        : root_(folder + "/items/Documents"),
           count_(count),
           world_(made(root_), folder + "/items/state") {
         for (std::uint64_t i = 0; i < count_; ++i) {

@@ -49,6 +49,7 @@ void compareStoreSize(Suite& suite);
 void compareApplications(Suite& suite);
 void compareWatchman(Suite& suite);
 void compareImports(Suite& suite);
+void compareChanges(Suite& suite);
 void compareItemActions(Suite& suite);
 
 enum class MemoryOf { index, listing, recording };

@@ -151,10 +151,14 @@ std::string Watchman::clock(const std::string& folder) {
         "clock");
 }
 
-std::size_t Watchman::since(const std::string& folder, const std::string& clock) {
+std::size_t Watchman::since(const std::string& folder, const std::string& clock, Fields fields) {
+    const std::string_view wanted =
+        fields == Fields::names
+            ? R"("name")"
+            : R"("name","exists","new","size","mode","uid","gid","mtime_ms","ctime_ms","ino","dev","nlink","type","cclock")";
     const std::string answer =
-        ask(fmt::format(R"(["query","{}",{{"since":"{}","fields":["name"],"sync_timeout":{}}}])",
-                        folder, clock, patienceMilliseconds));
+        ask(fmt::format(R"(["query","{}",{{"since":"{}","fields":[{}],"sync_timeout":{}}}])",
+                        folder, clock, wanted, patienceMilliseconds));
     if (answer.find("\"is_fresh_instance\":true") != std::string::npos) {
         throw std::runtime_error("watchman lost what changed");
     }

@@ -23,9 +23,11 @@ class Watchman {
     void forget(const std::string& folder);
     // Where it stands, once it has seen everything that was done before.
     [[nodiscard]] std::string clock(const std::string& folder);
-    // The names of what changed since that clock: how many bytes of answer that is. Throws when the
-    // answer is that everything may have changed.
-    std::size_t since(const std::string& folder, const std::string& clock);
+    // What changed since that clock, by name or with all that it knows: how many bytes of answer
+    // that is. Throws when the answer is that everything may have changed.
+    enum class Fields { names, status };
+    std::size_t since(const std::string& folder, const std::string& clock,
+                      Fields fields = Fields::names);
     // From then on `waitForChange` returns with the next thing that it tells.
     void subscribe(const std::string& folder);
     void unsubscribe(const std::string& folder);

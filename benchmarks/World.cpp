@@ -79,8 +79,13 @@ native::StoreOptions storeOptions(const std::string& root, const std::string& st
             .log = nullptr};
 }
 
-std::unique_ptr<native::Store> openedStore(const std::string& root, const std::string& state) {
-    auto store = native::Store::open(storeOptions(root, state));
+using Recording = native::StoreOptions::Recording;
+
+std::unique_ptr<native::Store> openedStore(const std::string& root, const std::string& state,
+                                           Recording recording = Recording::once) {
+    auto options = storeOptions(root, state);
+    options.recording = recording;
+    auto store = native::Store::open(options);
     if (!store) {
         throw std::runtime_error(store.error().description());
     }
@@ -99,9 +104,10 @@ std::unique_ptr<native::Temporaries> openedTemporaries(const std::string& state)
 
 class World::Parts {
   public:
-    Parts(const std::string& root, const std::string& state, ApplicationRegistry* registry)
+    Parts(const std::string& root, const std::string& state, ApplicationRegistry* registry,
+          Recording recording = Recording::once)
         : applications(registry ? *registry : noApplications),
-          store(openedStore(root, state)),
+          store(openedStore(root, state, recording)),
           trees({root}, {state, state + "/cache"}),
           temporaries(openedTemporaries(state)),
           manager(URL::fileURL(root)),
@@ -160,6 +166,8 @@ World::World(const std::string& root, const std::string& state)
     : parts_(std::make_unique<Parts>(root, state, nullptr)) {}
 World::World(const std::string& root, const std::string& state, ApplicationRegistry& applications)
     : parts_(std::make_unique<Parts>(root, state, &applications)) {}
+World::World(const std::string& root, const std::string& state, Recording recording)
+    : parts_(std::make_unique<Parts>(root, state, nullptr, recording)) {}
 World::~World() = default;
 
 native::Store& World::store() {

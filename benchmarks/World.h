@@ -22,6 +22,9 @@ class World {
     World(const std::string& root, const std::string& state);
     // On a system with these applications, which outlive it.
     World(const std::string& root, const std::string& state, ApplicationRegistry& applications);
+    // Over a store that records as a service does.
+    World(const std::string& root, const std::string& state,
+          native::StoreOptions::Recording recording);
     ~World();
     World(const World&) = delete;
     World& operator=(const World&) = delete;

@@ -69,6 +69,7 @@ int run(const std::vector<std::string>& arguments) {
         {"applications", compareApplications},
         {"imports", compareImports},
         {"actions", compareItemActions},
+        {"changes", compareChanges},
         {"watchman", compareWatchman}};
     for (const auto& [name, compare] : parts) {
         if (options->only && *options->only != name) {
