@@ -10,6 +10,7 @@
 #include "providers/marrowdale/actions/TrashAttributes.h"
 #include "providers/marrowdale/items/AppLibraryOfURL.h"
 #include "providers/marrowdale/items/ItemLookup.h"
+#include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 
 namespace marrowdale {
 
@@ -217,7 +218,17 @@ void deleteItem(const Platform& platform, std::string_view itemIdentifier,
         handler(errorForNonExistentItem(itemIdentifier));
         return;
     }
-    platform.fileOperations.deleteItemAtURL(*url, std::move(handler));
+    // Asked for again, behind all looks at the place, which another file may have taken meanwhile.
+    const auto file = fileWithItemIdentifier(platform, itemIdentifier);
+    if (!file && itemIdentifier.find('=') != std::string_view::npos) {
+        handler(errorForNonExistentItem(itemIdentifier));
+        return;
+    }
+    const URL meant = url->withoutCachedValues();
+    if (file) {
+        meant.setCachedResourceValue(ResourceKey::fileID, Number(raw(*file)));
+    }
+    platform.fileOperations.deleteItemAtURL(meant, std::move(handler));
 }
 
 }  // namespace marrowdale

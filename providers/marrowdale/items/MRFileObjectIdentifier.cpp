@@ -342,6 +342,20 @@ std::optional<URL> fileURLWithItemIdentifier(const Platform& platform,
     return file ? _fileURLWithFileIdentifier(platform, *file, *device) : std::nullopt;
 }
 
+std::optional<FileID> fileWithItemIdentifier(const Platform& platform,
+                                             std::string_view identifier) {
+    const bool isDocument = identifier.starts_with("did=");
+    if (!isDocument && !identifier.starts_with("fid=")) {
+        return std::nullopt;
+    }
+    const std::int64_t number = leadingNumber(identifier.substr(identifier.find('=') + 1));
+    if (!isDocument) {
+        return FileID{static_cast<std::uint64_t>(number)};
+    }
+    const auto device = storageDevice(platform);
+    return device ? resolveDocument(platform, number, *device) : std::nullopt;
+}
+
 std::optional<URL> fileURLWithFileIdentifier(const Platform& platform, FileID fileID) {
     const auto device = storageDevice(platform);
     return device ? _fileURLWithFileIdentifier(platform, fileID, *device) : std::nullopt;

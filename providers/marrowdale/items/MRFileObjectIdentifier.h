@@ -29,6 +29,10 @@ namespace marrowdale {
 // everything else is refused.
 [[nodiscard]] std::optional<URL> fileURLWithItemIdentifier(const Platform& platform,
                                                            std::string_view identifier);
+// The file that a "did=" or "fid=" names, wherever it stands; none, and no line in the log, for
+// what is neither.
+[[nodiscard]] std::optional<FileID> fileWithItemIdentifier(const Platform& platform,
+                                                           std::string_view identifier);
 // On the storage root's volume.
 [[nodiscard]] std::optional<URL> fileURLWithFileIdentifier(const Platform& platform, FileID fileID);
 [[nodiscard]] std::optional<URL> _fileURLWithFileIdentifier(const Platform& platform, FileID fileID,
