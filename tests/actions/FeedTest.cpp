@@ -11,6 +11,7 @@
 #include "platform/testing/CollectingChangeObserver.h"
 #include "platform/testing/TestFileSystems.h"
 #include "platform/testing/TestFiles.h"
+#include "platform/testing/TestSkip.h"
 #include "tests/actions/ActionsWorld.h"
 #include "tests/changes/Replica.h"
 
@@ -166,7 +167,7 @@ TEST_P(FeedTest, whatIsDeletedIsToldAlone) {
 
 TEST_P(FeedTest, metadataIsToldOfItsItem) {
     if (!keepsUserAttributes(world_.root())) {
-        GTEST_SKIP() << "the file system keeps no user attributes";
+        MARROWDALE_SKIP("the file system keeps no user attributes");
     }
     const std::string item = world_.identifierOf("box/a");
     expect([&] { done(world_.favorite(item, 7)); }, {"a"});
