@@ -47,6 +47,7 @@ class FeedTest : public testing::TestWithParam<std::tuple<TestFileSystem, Record
     // Has something done, and compares what a client hears of it.
     void expect(const std::function<void()>& action, const Names& updates,
                 const Names& deletions = {}) {
+        settle();  // what the step before has made
         const Data since = client_.anchor();
         action();
         Names updated;
