@@ -1,4 +1,6 @@
+#include <algorithm>
 #include <filesystem>
+#include <iterator>
 #include <map>
 
 #include "platform/foundation/KeyedArchive.h"
@@ -60,6 +62,42 @@ TEST_P(LocalFileEnumeratorTest, theWorkingSetListsOnlyTheDirectContentsOfTheTras
     for (const auto& item : observer.pageItems) {
         EXPECT_TRUE(item->isTrashed);
     }
+}
+
+TEST_P(LocalFileEnumeratorTest, aPageOfTheWorkingSetGoesOnInTheNextTrash) {
+    makeFolder(world_.path("one/.Trash"));
+    makeFolder(world_.path("two/.Trash"));
+    makeFiles("one/.Trash/a", 150);
+    makeFiles("two/.Trash/b", 150);
+    LocalFileEnumerator both(platform_, std::string(VantrelWorkingSetContainerItemIdentifier),
+                             {world_.url("one"), world_.url("two")});
+    CollectingObserver first;
+    both.enumerateItemsForObserver(first, byName);
+    CollectingObserver second;
+    both.enumerateItemsForObserver(second, first.nextPage.value());
+    EXPECT_EQ(first.pageItems.size(), 200U);
+    EXPECT_EQ(second.pageItems.size(), 100U);
+    EXPECT_EQ(second.nextPage, std::nullopt);
+    const auto isOfFirst = [](const std::string& name) { return name.starts_with("a"); };
+    EXPECT_EQ(std::ranges::count_if(first.filenames(), isOfFirst), 150);
+    EXPECT_EQ(world_.sink->count("[DEBUG] gather phase finished for " + world_.path("one/.Trash") +
+                                 ", " + world_.path("two/.Trash")),
+              1U);
+    std::vector<std::string> names = first.filenames();
+    std::ranges::copy(second.filenames(), std::back_inserter(names));
+    std::ranges::sort(names);
+    EXPECT_EQ(std::ranges::unique(names).begin(), names.end()) << "each came once";
+}
+
+TEST_P(LocalFileEnumeratorTest, thePageIsMadeInASectionThatNamesContainerAndPage) {
+    (void)page(byName);
+    (void)page(VantrelInitialPageSortedByDate());
+    const std::string title =
+        " enumerate items for " + std::string(VantrelRootContainerItemIdentifier) + " with page ";
+    EXPECT_EQ(world_.sink->count("[DEBUG] ┏0" + title + "initialPageSortedByName"), 1U);
+    EXPECT_EQ(world_.sink->count("[DEBUG] ┗0"), 1U);
+    EXPECT_EQ(world_.sink->count("[DEBUG] ┏1" + title + "initialPageSortedByDate"), 1U);
+    EXPECT_EQ(world_.sink->count("[DEBUG] ┗1"), 1U);
 }
 
 TEST_P(LocalFileEnumeratorTest, aWorkingSetWithoutATrashFolderIsEmptyAndSaysSo) {
