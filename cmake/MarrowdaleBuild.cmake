@@ -5,6 +5,7 @@ include(GNUInstallDirs)
 option(MARROWDALE_TESTS "Build the tests" OFF)
 option(MARROWDALE_FUZZ "Build the fuzzers (clang only)" OFF)
 option(MARROWDALE_BENCHMARKS "Build the benchmarks" OFF)
+option(MARROWDALE_PRECOMPILE "Test programs read the headers that all tests use once" OFF)
 set(MARROWDALE_SANITIZE "" CACHE STRING "Value of -fsanitize=, empty for none")
 
 set(CMAKE_CXX_STANDARD 23)
@@ -74,10 +75,9 @@ function(marrowdale_test name)
   cmake_parse_arguments(PARSE_ARGV 1 arg "" "" "SOURCES;DEPENDS")
   add_executable(${name} ${arg_SOURCES})
   target_link_libraries(${name} PRIVATE ${arg_DEPENDS} GTest::gtest_main GTest::gmock)
-  if(MARROWDALE_SANITIZE)
-    # What is tested is optimised, for the tests' speed. The tests are not, and read the headers that
-    # all of them use once a program: that halves the build.
-    target_compile_options(${name} PRIVATE -O0)
+  # What is tested is optimised, for the tests' speed; the tests themselves, for the build's, are not.
+  target_compile_options(${name} PRIVATE -O0)
+  if(MARROWDALE_PRECOMPILE)
     target_precompile_headers(${name} PRIVATE "${CMAKE_SOURCE_DIR}/cmake/TestHeaders.h")
   endif()
   # Listed when ctest starts: which file systems a test runs on is known only then.

@@ -1,5 +1,6 @@
-// What nearly every test includes, read once for each test program under the sanitizers. The plain
-// build does without, and so finds the file that does not name what it uses.
+// What nearly every test includes, read once for each test program: that and no optimisation halve
+// the build of the tests. The lint does without, and so finds the file that does not name what it
+// uses.
 #pragma once
 
 #include <algorithm>

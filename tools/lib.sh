@@ -77,7 +77,7 @@ build_preset() {
         folder=build
     fi
     if command -v ccache >/dev/null; then
-        export CMAKE_CXX_COMPILER_LAUNCHER=ccache
+        export CMAKE_CXX_COMPILER_LAUNCHER=ccache CCACHE_SLOPPINESS=pch_defines,time_macros
     fi
     if [[ ! -f $folder/.ninja_log ]]; then
         say "Building ($preset); the first time takes some minutes"
