@@ -1,5 +1,6 @@
 #include "host/daemon/LocalRequests.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <future>
 #include <utility>
@@ -154,6 +155,7 @@ LocalRequests::Watch::Watch(LocalRequests& requests, std::vector<std::string> co
     for (const auto& enumerator : enumerators_) {
         enumerator->start();
     }
+    watchTrashes();
     requests_.watches_.insert(this);
 }
 
@@ -178,6 +180,15 @@ void LocalRequests::Watch::renew() {
             std::swap(enumerators_[i], *fresh);
             (*fresh)->invalidate();
         }
+    }
+    watchTrashes();
+}
+
+void LocalRequests::Watch::watchTrashes() {
+    if (requests_.services_.watchTrashes != nullptr &&
+        std::ranges::find(containers_, VantrelWorkingSetContainerItemIdentifier) !=
+            containers_.end()) {
+        trashes_ = requests_.services_.watchTrashes();
     }
 }
 

@@ -3,6 +3,7 @@
 #include <atomic>
 #include <cstdint>
 #include <functional>
+#include <memory>
 #include <mutex>
 #include <set>
 #include <string>
@@ -12,6 +13,7 @@
 #include "host/daemon/LocalActions.h"
 #include "host/daemon/ReplicaKeeper.h"
 #include "host/daemon/SignalHub.h"
+#include "host/daemon/TrashWatch.h"
 #include "host/requests/HostRequests.h"
 #include "platform/hostframework/FileProviderExtension.h"
 
@@ -31,6 +33,8 @@ struct LocalServices {
     // Called once the extension knows which app libraries there are, and after every later refresh;
     // may be null.
     std::function<void()> librariesAreKnown = nullptr;
+    // Watches the trashes of all documents folders of now; may be null.
+    std::function<std::unique_ptr<TrashWatch>()> watchTrashes = nullptr;
 };
 
 // A host's requests to the extension in its own process. Where the extension answers no value, the
@@ -117,10 +121,12 @@ class LocalRequests::Watch {
     // The libraries are others than before: holds enumerators that watch those of now. Called with
     // the requests' lock.
     void renew();
+    void watchTrashes();
 
     LocalRequests& requests_;
     const std::vector<std::string> containers_;
-    Enumerators enumerators_;  // guarded by the requests' lock
+    Enumerators enumerators_;              // guarded by the requests' lock
+    std::unique_ptr<TrashWatch> trashes_;  // the same; null where the working set is not watched
     std::unique_ptr<SignalHub::Subscription> subscription_;
 };
 

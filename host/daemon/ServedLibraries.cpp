@@ -20,6 +20,11 @@ std::vector<std::string> ServedLibraries::rootsWith(const std::vector<std::strin
     return roots;
 }
 
+std::vector<std::string> ServedLibraries::roots() const {
+    const MutexLock lock(mutex_);
+    return rootsWith(paths_);
+}
+
 void ServedLibraries::attach(native::Store& store, native::ServedTrees& trees,
                              const std::vector<std::string>& paths, Log& log) {
     const MutexLock lock(mutex_);

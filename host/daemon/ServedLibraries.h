@@ -28,6 +28,8 @@ class ServedLibraries {
     // which the store reports.
     void set(const std::vector<std::string>& paths);
 
+    // The storage root, and the folders of now.
+    [[nodiscard]] std::vector<std::string> roots() const;
     // The storage root, and these folders.
     [[nodiscard]] std::vector<std::string> rootsWith(const std::vector<std::string>& paths) const;
 
@@ -36,7 +38,7 @@ class ServedLibraries {
 
     const std::string rootPath_;
     // Held while they are told, so that what is set last is told last.
-    Mutex mutex_;
+    mutable Mutex mutex_;
     std::vector<std::string> paths_ MARROWDALE_GUARDED_BY(mutex_);
     native::Store* store_ MARROWDALE_GUARDED_BY(mutex_) = nullptr;
     native::ServedTrees* trees_ MARROWDALE_GUARDED_BY(mutex_) = nullptr;

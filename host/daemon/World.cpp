@@ -14,6 +14,7 @@
 #include "host/daemon/MarkedFileEvents.h"
 #include "host/daemon/Mounts.h"
 #include "host/daemon/ServedLibraries.h"
+#include "host/daemon/TrashWatch.h"
 #include "platform/Platform.h"
 #include "platform/linux/files/LinuxApplicationSupport.h"
 #include "platform/linux/files/LinuxExtendedAttributes.h"
@@ -128,15 +129,20 @@ class World::Parts {
             return std::unexpected(std::move(extension.error()));
         }
         extension_ = std::move(*extension);
-        requests_.emplace(
-            LocalServices{.extension = *extension_,
-                          .signals = manager_.signals(),
-                          .rootPath = options_.settings.rootPath,
-                          .replicaPath = options_.settings.stateFolder + "/replica.sqlite",
-                          .stateFolder = options_.settings.stateFolder,
-                          .findings = [this] { return findings(); },
-                          .forgetApplications = [this] { applications_.forgetIcons(); },
-                          .librariesAreKnown = [this] { libraryWitness_.lookAgain(); }});
+        requests_.emplace(LocalServices{
+            .extension = *extension_,
+            .signals = manager_.signals(),
+            .rootPath = options_.settings.rootPath,
+            .replicaPath = options_.settings.stateFolder + "/replica.sqlite",
+            .stateFolder = options_.settings.stateFolder,
+            .findings = [this] { return findings(); },
+            .forgetApplications = [this] { applications_.forgetIcons(); },
+            .librariesAreKnown = [this] { libraryWitness_.lookAgain(); },
+            .watchTrashes =
+                [this] {
+                    return std::make_unique<TrashWatch>(fileEvents_, manager_.signals(), *log_,
+                                                        applicationSide_->libraries.roots());
+                }});
         manager_.setIndexCleaner([this](std::vector<std::string> domains) {
             requests_->replica().removeDomains(std::move(domains));
         });

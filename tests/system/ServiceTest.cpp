@@ -183,6 +183,22 @@ TEST_F(ServiceTest, watchTellsOfEveryChangeUntilItIsInterrupted) {
     }
 }
 
+TEST_F(ServiceTest, whoWatchesIsToldOfWhatSomebodyElseDoesInTheTrash) {
+    makeFolder(home_.document(".Trash"));
+    const Service service(home_);
+    ChildProcess watch(home_.command({"--json", "watch"}));
+    std::string output;
+    int made = 0;
+    // When it has begun to watch it does not say.
+    EXPECT_TRUE(waitUntil([&] {
+        writeFile(home_.document(".Trash/" + std::to_string(++made)), "");
+        constexpr std::chrono::seconds aWhile{2};
+        output = watch.readOutput(output.size() + 1, aWhile);
+        return output.contains("WorkingSet");
+    }));
+    EXPECT_FALSE(output.contains("RootContainer")) << "the documents are what they were";
+}
+
 TEST_F(ServiceTest, aSecondServiceIsRefusedAndSaysWhoServes) {
     Service service(home_);
     const Json error = home_.error({"serve"}, 3);
