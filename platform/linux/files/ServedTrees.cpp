@@ -18,11 +18,6 @@ std::string withoutTrailingSlashes(std::string path) {
     return path;
 }
 
-// `folder` is without a slash at its end, so empty for the file system's root.
-bool contains(std::string_view folder, std::string_view path) {
-    return path.starts_with(folder) && (path.size() == folder.size() || path[folder.size()] == '/');
-}
-
 Error notServed(const std::string& path) {
     return errorWithPOSIXCode(ENOENT, "look in the served folders for", path);
 }
@@ -46,7 +41,9 @@ ServedTrees::ServedTrees(const std::vector<std::string>& rootFolders,
         }
     }
     for (const std::string& path : rootFolders) {
-        roots_.push_back(openRoot(path));
+        auto root = openRoot(path);
+        std::string name = root->path;
+        roots_.emplace(std::move(name), std::move(root));
     }
 }
 
@@ -59,13 +56,14 @@ std::shared_ptr<const ServedTrees::Folder> ServedTrees::openRoot(const std::stri
 }
 
 void ServedTrees::setRoots(const std::vector<std::string>& rootFolders) {
-    std::vector<std::shared_ptr<const Folder>> roots;
+    Roots roots;
     for (const std::string& path : rootFolders) {
+        std::string name = withoutTrailingSlashes(path);
         auto known = rootOf(path);
         const auto stands = statEntry(AT_FDCWD, path.c_str());
-        const bool isSame = known != nullptr && known->path == withoutTrailingSlashes(path) &&
-                            stands && known->isAt(*stands);
-        roots.push_back(isSame ? std::move(known) : openRoot(path));
+        const bool isSame =
+            known != nullptr && known->path == name && stands && known->isAt(*stands);
+        roots.emplace(std::move(name), isSame ? std::move(known) : openRoot(path));
     }
     const std::lock_guard lock(mutex_);
     roots_ = std::move(roots);
@@ -113,14 +111,14 @@ bool ServedTrees::liesBelow(const Folder& inner, const Folder& outer) {
 
 std::shared_ptr<const ServedTrees::Folder> ServedTrees::rootOf(std::string_view path) const {
     const std::lock_guard lock(mutex_);
-    std::shared_ptr<const Folder> innermost;
-    for (const auto& root : roots_) {
-        if (contains(root->path, path) &&
-            (innermost == nullptr || root->path.size() > innermost->path.size())) {
-            innermost = root;
+    // Up from the path itself; the file system's root is the empty path.
+    for (std::size_t end = path.size(); end != std::string_view::npos;
+         end = end == 0 ? std::string_view::npos : path.rfind('/', end - 1)) {
+        if (const auto root = roots_.find(path.substr(0, end)); root != roots_.end()) {
+            return root->second;
         }
     }
-    return innermost;
+    return nullptr;
 }
 
 Expected<std::optional<ServedTrees::Location>> ServedTrees::locate(std::string_view path) const {

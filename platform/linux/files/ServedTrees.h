@@ -1,10 +1,12 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <vector>
 
 #include "platform/foundation/Error.h"
@@ -74,8 +76,15 @@ class ServedTrees {
     [[nodiscard]] std::shared_ptr<const Folder> rootOf(std::string_view path) const;
     [[nodiscard]] Expected<UniqueFD> holdInSteps(int root, const std::string& relativePath) const;
 
+    // By path without a slash at the end. There are as many as there are applications, and every
+    // look at a file begins here.
+    struct PathHash : std::hash<std::string_view> {
+        using is_transparent = void;
+    };
+    using Roots =
+        std::unordered_map<std::string, std::shared_ptr<const Folder>, PathHash, std::equal_to<>>;
     mutable std::mutex mutex_;
-    std::vector<std::shared_ptr<const Folder>> roots_;  // guarded by mutex_
+    Roots roots_;  // guarded by mutex_
     std::vector<Folder> private_;
 };
 
