@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -56,6 +57,14 @@ class FileSystem {
     // file domain's error 260.
     [[nodiscard]] virtual Expected<ResourceValue> resourceValue(const URL& url,
                                                                 ResourceKey key) = 0;
+
+    // The URL with what a listing of its folder brings along of each entry: the values of those
+    // keys, attributes and status, by one look and so of one moment; but for a document identifier.
+    // The URL as it is where the item can't be looked at, and for a link.
+    [[nodiscard]] virtual URL lookedAt(const URL& url, const ResourceKeySet& /*keys*/,
+                                       std::span<const std::string> /*attributeNames*/) {
+        return url;
+    }
 
     // The path of a file by its number: the place where it stands now. ENOENT when the volume's
     // served trees hold no such file, ENXIO for another volume.

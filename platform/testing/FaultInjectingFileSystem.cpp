@@ -36,6 +36,13 @@ Expected<ResourceValue> FaultInjectingFileSystem::resourceValue(const URL& url, 
     return answer ? std::move(*answer) : ForwardingFileSystem::resourceValue(url, key);
 }
 
+URL FaultInjectingFileSystem::lookedAt(const URL& url, const ResourceKeySet& keys,
+                                       std::span<const std::string> attributeNames) {
+    return statusAnswer || resourceAnswer
+               ? url
+               : ForwardingFileSystem::lookedAt(url, keys, attributeNames);
+}
+
 Expected<std::string> FaultInjectingFileSystem::pathForFileID(DeviceID device, FileID file) {
     auto answer = ask(pathAnswer, device, file);
     return answer ? std::move(*answer) : ForwardingFileSystem::pathForFileID(device, file);

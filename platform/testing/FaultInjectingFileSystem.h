@@ -27,6 +27,9 @@ class FaultInjectingFileSystem : public ForwardingFileSystem {
     Expected<CommonAttributes> commonAttributes(const OpenFile& file) override;
     Expected<FileStatus> status(const URL& url) override;
     Expected<ResourceValue> resourceValue(const URL& url, ResourceKey key) override;
+    // Brings nothing along where a hook answers for single values.
+    URL lookedAt(const URL& url, const ResourceKeySet& keys,
+                 std::span<const std::string> attributeNames) override;
     Expected<std::string> pathForFileID(DeviceID device, FileID file) override;
     Expected<std::unique_ptr<DirectoryEnumerator>> enumerateDirectory(
         const DirectoryEnumerationRequest& request) override;

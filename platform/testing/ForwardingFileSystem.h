@@ -19,6 +19,10 @@ class ForwardingFileSystem : public FileSystem {
     Expected<ResourceValue> resourceValue(const URL& url, ResourceKey key) override {
         return target_.resourceValue(url, key);
     }
+    URL lookedAt(const URL& url, const ResourceKeySet& keys,
+                 std::span<const std::string> attributeNames) override {
+        return target_.lookedAt(url, keys, attributeNames);
+    }
     Expected<std::string> pathForFileID(DeviceID device, FileID file) override {
         return target_.pathForFileID(device, file);
     }

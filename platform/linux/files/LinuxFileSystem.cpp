@@ -1,5 +1,6 @@
 #include "platform/linux/files/LinuxFileSystem.h"
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <fcntl.h>
@@ -191,10 +192,63 @@ void LinuxFileSystem::cacheAccess(const URL& url, const Place& place, const Entr
             ask = answer.found.hasAccessList || !answer.complete;
         });
     }
-    const Access access = ask ? askAccess(place.directory(), place.name())
-                              : computeAccess(status, sources_.credentials, mountAt(place));
+    const Access access = accessTo(place, status, ask);
     url.setCachedResourceValue(ResourceKey::isReadable, access.readable);
     url.setCachedResourceValue(ResourceKey::isWritable, access.writable);
+}
+
+Access LinuxFileSystem::accessTo(const Place& place, const EntryStatus& status,
+                                 bool hasAccessList) const {
+    return hasAccessList && dependsOnAccessList(status, sources_.credentials)
+               ? askAccess(place.directory(), place.name())
+               : computeAccess(status, sources_.credentials, mountAt(place));
+}
+
+URL LinuxFileSystem::lookedAt(const URL& url, const ResourceKeySet& keys,
+                              std::span<const std::string> attributeNames) {
+    const Date now = Date::now();
+    const auto place = Place::of(url, sources_.trees);
+    const auto status = place ? place->look() : Unexpected(place.error());
+    if (!status || status->isSymbolicLink()) {
+        return url;
+    }
+    PrefetchedValues values = describeEntry(*status, url.lastPathComponent(), keys, sources_);
+    values.known.erase(ResourceKey::documentIdentifier);
+    values.hasStatus = true;
+    values.status = fileStatusOf(*status, sources_.documents);
+    const auto reader = readerOf(attributeNames);
+    const FoundAttributes found = attributesOf(*place, *status, *reader, now);
+    values.attributes = found.set ? found.set : reader->emptySet();
+    const Access access = accessTo(*place, *status, found.hasAccessList);
+    values.isReadable = access.readable;
+    values.isWritable = access.writable;
+    return URL::listedChild(url.deletingLastPathComponent(), url.lastPathComponent(),
+                            std::move(values));
+}
+
+FoundAttributes LinuxFileSystem::attributesOf(const Place& place, const EntryStatus& status,
+                                              const AttributeReader& reader, Date now) {
+    if (auto known = sources_.attributes.find(status, reader.fingerprint())) {
+        return *std::move(known);
+    }
+    AttributeReader::Answer answer;
+    sources_.calls.inFolder(place.directory(), [&](const AttributeCalls::InFolder& folder) {
+        answer = reader.read(folder, place.name());
+    });
+    if (answer.complete) {
+        sources_.attributes.insert(status, reader.fingerprint(), answer.found, now);
+    }
+    return answer.found;
+}
+
+std::shared_ptr<const AttributeReader> LinuxFileSystem::readerOf(
+    std::span<const std::string> attributeNames) {
+    const std::lock_guard lock(mutex_);
+    if (!reader_ || !std::ranges::equal(names_, attributeNames)) {
+        names_.assign(attributeNames.begin(), attributeNames.end());
+        reader_ = std::make_shared<const AttributeReader>(names_);
+    }
+    return reader_;
 }
 
 Expected<std::string> LinuxFileSystem::pathForFileID(DeviceID device, FileID file) {

@@ -1,5 +1,11 @@
 #pragma once
 
+#include <memory>
+#include <mutex>
+#include <span>
+#include <string>
+#include <vector>
+
 #include "platform/linux/files/AttributeReader.h"
 #include "platform/linux/files/EntryStatus.h"
 #include "platform/linux/files/FileSources.h"
@@ -18,6 +24,8 @@ class LinuxFileSystem final : public FileSystem {
     [[nodiscard]] Expected<CommonAttributes> commonAttributes(const OpenFile& file) override;
     [[nodiscard]] Expected<FileStatus> status(const URL& url) override;
     [[nodiscard]] Expected<ResourceValue> resourceValue(const URL& url, ResourceKey key) override;
+    [[nodiscard]] URL lookedAt(const URL& url, const ResourceKeySet& keys,
+                               std::span<const std::string> attributeNames) override;
     [[nodiscard]] Expected<std::string> pathForFileID(DeviceID device, FileID file) override;
     [[nodiscard]] Expected<std::unique_ptr<DirectoryEnumerator>> enumerateDirectory(
         const DirectoryEnumerationRequest& request) override;
@@ -28,9 +36,19 @@ class LinuxFileSystem final : public FileSystem {
     [[nodiscard]] Expected<void> cacheDocumentIdentifier(const URL& url, const Place& place,
                                                          const EntryStatus& status);
     void cacheAccess(const URL& url, const Place& place, const EntryStatus& status);
+    [[nodiscard]] Access accessTo(const Place& place, const EntryStatus& status,
+                                  bool hasAccessList) const;
+    [[nodiscard]] std::shared_ptr<const AttributeReader> readerOf(
+        std::span<const std::string> attributeNames);
+    [[nodiscard]] FoundAttributes attributesOf(const Place& place, const EntryStatus& status,
+                                               const AttributeReader& reader, Date now);
 
     FileSources sources_;
     AttributeReader accessLists_{{}};
+    // Everybody asks for the same names.
+    std::mutex mutex_;
+    std::vector<std::string> names_;                 // guarded by mutex_
+    std::shared_ptr<const AttributeReader> reader_;  // of these names; guarded by mutex_
 };
 
 }  // namespace marrowdale::native

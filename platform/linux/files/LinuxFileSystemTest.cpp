@@ -3,6 +3,7 @@
 #include <filesystem>
 #include <sys/mount.h>
 #include <sys/stat.h>
+#include <sys/xattr.h>
 #include <unistd.h>
 
 #include "platform/linux/files/EntryValues.h"
@@ -62,6 +63,55 @@ TEST_P(LinuxFileSystemTest, oneLookCachesWhatItBrought) {
               ResourceValue(std::string("application/pdf")));
     EXPECT_FALSE(world_.files.resourceValue(world_.url("a.pdf"), ResourceKey::fileSize));
     EXPECT_EQ(world_.documents.assignCalls(), 0);
+}
+
+TEST_P(LinuxFileSystemTest, aLookBringsAllOfOneMoment) {
+    makeFolder(world_.at("folder"));
+    makeFolder(world_.at("folder/below"));
+    ASSERT_EQ(::setxattr(world_.at("folder").c_str(), "user.tag", "red", 3, 0), 0);
+    const ResourceKeySet keys{ResourceKey::typeIdentifier, ResourceKey::isWritable,
+                              ResourceKey::contentModificationDate,
+                              ResourceKey::documentIdentifier};
+    const std::vector<std::string> names{"tag", "other"};
+    const URL plain = world_.url("folder");
+    const URL looked = world_.files.lookedAt(plain, keys, names);
+    EXPECT_EQ(looked, plain);
+    const PrefetchedValues* const values = looked.prefetched();
+    ASSERT_NE(values, nullptr);
+    EXPECT_FALSE(values->known.contains(ResourceKey::documentIdentifier));
+    for (const ResourceKey key : {ResourceKey::typeIdentifier, ResourceKey::isWritable,
+                                  ResourceKey::contentModificationDate}) {
+        EXPECT_EQ(*world_.files.resourceValue(looked, key),
+                  *world_.files.resourceValue(plain, key));
+    }
+    std::filesystem::remove_all(world_.at("folder"));
+    ASSERT_TRUE(world_.files.status(looked));
+    EXPECT_TRUE(world_.files.status(looked)->isDirectory);
+    ASSERT_NE(values->attributes, nullptr);
+    EXPECT_EQ(**values->attributes->value("tag"), Data::fromText("red"));
+    EXPECT_EQ(*values->attributes->value("other"), std::nullopt);
+    EXPECT_EQ(*world_.files.resourceValue(looked, ResourceKey::typeIdentifier),
+              ResourceValue(std::string("inode/directory")));
+}
+
+TEST_P(LinuxFileSystemTest, aLookSeesAttributesThatChanged) {
+    makeFolder(world_.at("folder"));
+    const std::vector<std::string> names{"tag"};
+    for (const std::string tag : {"red", "blue"}) {
+        ASSERT_EQ(::setxattr(world_.at("folder").c_str(), "user.tag", tag.data(), tag.size(), 0),
+                  0);
+        const URL looked = world_.files.lookedAt(world_.url("folder"), {}, names);
+        EXPECT_EQ(**looked.prefetched()->attributes->value("tag"), Data::fromText(tag));
+    }
+}
+
+TEST_P(LinuxFileSystemTest, aLookAtNothingAndAtALinkBringsNothing) {
+    std::filesystem::create_symlink("none", world_.at("link"));
+    for (const char* name : {"none", "link"}) {
+        EXPECT_EQ(world_.files.lookedAt(world_.url(name), {ResourceKey::fileSize}, {}).prefetched(),
+                  nullptr)
+            << name;
+    }
 }
 
 TEST_P(LinuxFileSystemTest, documentIdentifierIsGivenOutOnceAndLasts) {

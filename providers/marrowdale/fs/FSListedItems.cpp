@@ -7,8 +7,7 @@
 namespace marrowdale {
 
 std::vector<std::string> listedAttributeNames() {
-    return {std::string(LocalItem::xattrLastUsedDateName), std::string(LocalItem::xattrTagDataName),
-            std::string(LocalItem::xattrFavoriteRankName)};
+    return LocalItem::listingAttributes();
 }
 
 std::vector<std::shared_ptr<LocalItem>> itemsOfListing(const Platform& platform,

@@ -30,8 +30,8 @@ std::shared_ptr<LocalAppLibraryItem> LocalAppLibraryItem::initFrom(const Platfor
         platform.log.error("can't create an app library item without a data container URL");
         return nullptr;
     }
-    auto item =
-        std::make_shared<LocalAppLibraryItem>(container->appendingPathComponent(documentsName));
+    auto item = std::make_shared<LocalAppLibraryItem>(platform.fileSystem.lookedAt(
+        container->appendingPathComponent(documentsName), listingKeys(), listingAttributes()));
     const Options options{.customItemID = appLibraryIdentifier(record),
                           .customParentItemID = std::string(VantrelRootContainerItemIdentifier),
                           .customFilename = record.localizedName(),

@@ -58,6 +58,13 @@ ResourceKeySet LocalItem::listingKeys() {
     return keys;
 }
 
+const std::vector<std::string>& LocalItem::listingAttributes() {
+    static const std::vector<std::string> names{std::string(xattrLastUsedDateName),
+                                                std::string(xattrTagDataName),
+                                                std::string(xattrFavoriteRankName)};
+    return names;
+}
+
 std::shared_ptr<LocalItem> LocalItem::initWithURL(const Platform& platform, const URL& url,
                                                   const Options& options,
                                                   ParentFolderCache* parents) {

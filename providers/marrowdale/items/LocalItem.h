@@ -36,6 +36,8 @@ class LocalItem : public FileProviderItem {
     // Those, and the ones that identifiers are made of: a listing gives out the document
     // identifiers of a whole page at once.
     [[nodiscard]] static ResourceKeySet listingKeys();
+    // The extended attributes that items are made of.
+    [[nodiscard]] static const std::vector<std::string>& listingAttributes();
 
     // What may be given instead of being read from the URL.
     struct Options {
