@@ -40,30 +40,40 @@ ServedTrees::ServedTrees(const std::vector<std::string>& rootFolders,
             private_.push_back(std::move(folder));
         }
     }
+    const Above above = abovePrivateFolders();
     for (const std::string& path : rootFolders) {
-        auto root = openRoot(path);
+        auto root = openRoot(path, above);
         std::string name = root->path;
         roots_.emplace(std::move(name), std::move(root));
     }
 }
 
-std::shared_ptr<const ServedTrees::Folder> ServedTrees::openRoot(const std::string& path) const {
+// Where it can't be known, private folders count as lying below, which only costs time.
+std::shared_ptr<const ServedTrees::Folder> ServedTrees::openRoot(const std::string& path,
+                                                                 const Above& above) {
     auto root = std::make_shared<Folder>(open(path));
     root->path = withoutTrailingSlashes(path);
-    root->holdsPrivateFolders = std::ranges::any_of(
-        private_, [&](const Folder& folder) { return liesBelow(folder, *root); });
+    root->holdsPrivateFolders =
+        root->held && (!above.isWhole ||
+                       std::ranges::any_of(above.folders,
+                                           [&](const auto& folder) { return root->isAt(folder); }));
     return root;
 }
 
 void ServedTrees::setRoots(const std::vector<std::string>& rootFolders) {
     Roots roots;
+    std::optional<Above> above;
     for (const std::string& path : rootFolders) {
         std::string name = withoutTrailingSlashes(path);
         auto known = rootOf(path);
         const auto stands = statEntry(AT_FDCWD, path.c_str());
         const bool isSame =
             known != nullptr && known->path == name && stands && known->isAt(*stands);
-        roots.emplace(std::move(name), isSame ? std::move(known) : openRoot(path));
+        if (!isSame) {
+            above = above ? std::move(above) : abovePrivateFolders();
+            known = openRoot(path, *above);
+        }
+        roots.emplace(std::move(name), std::move(known));
     }
     const std::lock_guard lock(mutex_);
     roots_ = std::move(roots);
@@ -88,25 +98,26 @@ ServedTrees::Folder ServedTrees::open(const std::string& path) {
     return folder;
 }
 
-// Up to the top; where that can't be reached it counts as lying below, which only costs time.
-bool ServedTrees::liesBelow(const Folder& inner, const Folder& outer) {
-    if (!outer.held) {
-        return false;
-    }
-    UniqueFD at = parentOf(inner.held.get());
-    std::optional<EntryStatus> before;
-    while (at) {
-        const auto status = statEntry(at.get(), "");
-        if (!status || outer.isAt(*status)) {
-            return true;
+ServedTrees::Above ServedTrees::abovePrivateFolders() const {
+    Above above;
+    for (const Folder& folder : private_) {
+        UniqueFD at = parentOf(folder.held.get());
+        std::optional<EntryStatus> below;
+        bool isTop = false;
+        while (at && !isTop) {
+            const auto status = statEntry(at.get(), "");
+            if (!status) {
+                break;
+            }
+            // Above the top is the top.
+            isTop = below && below->fileID == status->fileID && below->device == status->device;
+            below = *status;
+            above.folders.push_back(*status);
+            at = parentOf(at.get());
         }
-        if (before && before->fileID == status->fileID && before->device == status->device) {
-            return false;
-        }
-        before = *status;
-        at = parentOf(at.get());
+        above.isWhole = above.isWhole && isTop;
     }
-    return true;
+    return above;
 }
 
 std::shared_ptr<const ServedTrees::Folder> ServedTrees::rootOf(std::string_view path) const {

@@ -71,8 +71,14 @@ class ServedTrees {
     };
 
     [[nodiscard]] static Folder open(const std::string& path);
-    [[nodiscard]] static bool liesBelow(const Folder& inner, const Folder& outer);
-    [[nodiscard]] std::shared_ptr<const Folder> openRoot(const std::string& path) const;
+    // The folders above the private ones, up to the top, as they stand now.
+    struct Above {
+        std::vector<EntryStatus> folders;
+        bool isWhole = true;  // false: some can't be reached
+    };
+    [[nodiscard]] Above abovePrivateFolders() const;
+    [[nodiscard]] static std::shared_ptr<const Folder> openRoot(const std::string& path,
+                                                                const Above& above);
     [[nodiscard]] std::shared_ptr<const Folder> rootOf(std::string_view path) const;
     [[nodiscard]] Expected<UniqueFD> holdInSteps(int root, const std::string& relativePath) const;
 
