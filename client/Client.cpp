@@ -177,4 +177,28 @@ Result<std::vector<Item>> Service::search(const std::vector<std::string>& words)
     return found ? Result<std::vector<Item>>(itemsOf(*found)) : failed(found.error());
 }
 
+Result<std::vector<Item>> Service::applications() {
+    const auto libraries = connection_->requests().appLibraries();
+    return libraries ? Result<std::vector<Item>>(itemsOf(*libraries)) : failed(libraries.error());
+}
+
+Result<Item> Service::application(std::string_view bundleIdentifier) {
+    const auto library = connection_->requests().applicationContainer(bundleIdentifier);
+    return library ? Result<Item>(itemOf(**library)) : failed(library.error());
+}
+
+Result<void> Service::refreshApplications() {
+    const auto refreshed = connection_->requests().refreshApplications();
+    return refreshed ? Result<void>() : failed(refreshed.error());
+}
+
+Result<std::optional<std::string>> Service::thumbnail(std::string_view identifier) {
+    const auto thumbnails = connection_->requests().thumbnails({std::string(identifier)});
+    if (!thumbnails) {
+        return failed(thumbnails.error());
+    }
+    const auto& picture = thumbnails->front().data;
+    return picture ? std::optional(picture->text()) : std::nullopt;
+}
+
 }  // namespace marrowdale::client

@@ -4,7 +4,7 @@
 #include <unistd.h>
 
 #include "platform/foundation/KeyedArchive.h"
-#include "platform/linux/store/CRC32C.h"
+#include "platform/linux/files/CRC32C.h"
 
 namespace marrowdale::host {
 

@@ -43,7 +43,7 @@ struct World::ApplicationSide {
                .documentFoldersChanged =
                    [this](const std::vector<std::string>& paths) { libraries.set(paths); }}),
           foldersAtStart(applications.registry().documentFolders()),
-          packageExtensions(applications.registry().packageExtensions()),
+          packageExtensions(applications.registry().knownPackageExtensions()),
           packages(packageExtensions) {}
 
     ServedLibraries libraries;

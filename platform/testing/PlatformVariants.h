@@ -13,6 +13,8 @@ struct OtherServices {
     FileOperations* fileOperations = nullptr;
     GenerationStore* generationStore = nullptr;
     FileEventService* fileEvents = nullptr;
+    FileProviderManager* manager = nullptr;
+    SharedObjects* shared = nullptr;
 };
 
 [[nodiscard]] inline Platform withServices(const Platform& from, const OtherServices& others) {
@@ -27,8 +29,8 @@ struct OtherServices {
             .generationStore = chosen(others.generationStore, from.generationStore),
             .fileEvents = chosen(others.fileEvents, from.fileEvents),
             .applications = from.applications,
-            .manager = from.manager,
-            .shared = from.shared,
+            .manager = chosen(others.manager, from.manager),
+            .shared = chosen(others.shared, from.shared),
             .applicationSupport = from.applicationSupport,
             .deviceInformation = from.deviceInformation,
             .icons = from.icons,

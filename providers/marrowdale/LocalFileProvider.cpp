@@ -7,6 +7,7 @@
 #include "providers/marrowdale/LocalFileEnumerator.h"
 #include "providers/marrowdale/LocalRootEnumerator.h"
 #include "providers/marrowdale/apps/AppRefresh.h"
+#include "providers/marrowdale/apps/LocalAppLibraryManager.h"
 #include "providers/marrowdale/fs/FSRetiredReaders.h"
 #include "providers/marrowdale/items/ItemLookup.h"
 
@@ -33,6 +34,8 @@ LocalFileProvider::LocalFileProvider(const Platform& platform)
     });
     platform_.manager.signalEnumeratorForContainerItemIdentifier(
         VantrelWorkingSetContainerItemIdentifier, {});
+    // Identifiers and items know its libraries from the first look-up on, refreshed or not.
+    (void)LocalAppLibraryManager::shared(platform_);
 }
 
 LocalFileProvider::~LocalFileProvider() {

@@ -5,12 +5,16 @@
 
 #include "platform/foundation/Semaphore.h"
 #include "platform/hostframework/FileProviderConstants.h"
+#include "platform/linux/icons/CachedBitmap.h"
+#include "platform/testing/CollectingChangeObserver.h"
 #include "platform/testing/CollectingObserver.h"
+#include "platform/testing/PlatformVariants.h"
 #include "platform/testing/TestFileSystems.h"
 #include "platform/testing/TestFiles.h"
 #include "providers/marrowdale/LocalFileEnumerator.h"
 #include "providers/marrowdale/LocalFileProvider.h"
 #include "providers/marrowdale/LocalRootEnumerator.h"
+#include "providers/marrowdale/apps/LocalAppLibraryManager.h"
 #include "providers/marrowdale/items/ProviderError.h"
 #include "tests/support/TestWorld.h"
 
@@ -50,6 +54,67 @@ TEST_P(LocalFileProviderTest, initSignalsTheWorkingSet) {
     EXPECT_EQ(count("[INFO] auto notify changes on VantrelWorkingSetContainerItemIdentifier at "
                     "startup"),
               1U);
+}
+
+TEST_P(LocalFileProviderTest, librariesOfTheCacheAreKnownBeforeTheFirstRefresh) {
+    addLibrary();
+    const URL library = URL::fileURL(directory_.path("app/Documents"));
+    // As the working set's enumerator leaves it for the next process.
+    LocalRootEnumerator workingSet(world_.platform,
+                                   std::string(VantrelWorkingSetContainerItemIdentifier));
+    const auto observer = std::make_shared<CollectingChangeObserver>();
+    workingSet.currentSyncAnchorWithCompletionHandler([&](const std::optional<Data>& anchor) {
+        workingSet.enumerateChangesForObserver(observer, *anchor);
+    });
+    ASSERT_TRUE(waitUntil(
+        [&] { return world_.sink->countContaining(" saving bundle proxies to ~/") >= 2; }));
+    // A process that begins anew, in which no refresh comes to its turn.
+    SharedObjects shared;
+    const Platform platform = withServices(world_.platform, {.shared = &shared});
+    const auto looked = std::make_shared<Semaphore>();
+    LocalAppLibraryManager::backgroundQueue(platform).async([looked] { looked->wait(); });
+    {
+        LocalFileProvider fresh(platform);
+        EXPECT_EQ(fresh.persistentIdentifierForItemAtURL(library), "#org.example.Notes");
+        looked->signal();
+    }
+}
+
+TEST_P(LocalFileProviderTest, bothThumbnailRequestsAndTheBestIconAreOfTheApplication) {
+    addLibrary();
+    const auto image = native::cachedBitmapWithImage(
+        {.width = 1, .height = 1, .pixels = Data(Bytes{1, 2, 3, 255})});
+    const auto record =
+        std::const_pointer_cast<FakeBundleRecord>(std::dynamic_pointer_cast<const FakeBundleRecord>(
+            world_.applications.bundleRecordForIdentifier("org.example.Notes")));
+    record->icons.emplace(0, *image);
+    world_.device.scale = Number(1.0);
+    world_.device.deviceClass = Number(std::int64_t{1});
+    EXPECT_EQ(provider_.bestIconData(*record), *image);
+    std::vector<std::string> calls;
+    const auto done = [&](const std::optional<Error>& error) {
+        EXPECT_EQ(error, std::nullopt);
+        calls.emplace_back("done");
+    };
+    const FileProviderApplications::TypedThumbnailHandler typed =
+        [&](std::string_view identifier, const auto& data, const auto& format, const auto& error) {
+            EXPECT_EQ(data, *image);
+            EXPECT_EQ(format, VantrelThumbnailFormatCachedBitmap);
+            EXPECT_EQ(error, std::nullopt);
+            calls.emplace_back(identifier);
+        };
+    EXPECT_TRUE(
+        provider_.fetchThumbnailsForItemIdentifiers({"#org.example.Notes"}, {9, 9}, typed, done));
+    const FileProviderApplications::ThumbnailHandler plain =
+        [&](std::string_view identifier, const auto& data, const auto& error) {
+            EXPECT_TRUE(data && data->text().starts_with("\x89PNG"));
+            EXPECT_EQ(error, std::nullopt);
+            calls.emplace_back(identifier);
+        };
+    EXPECT_TRUE(
+        provider_.fetchThumbnailsForItemIdentifiers({"#org.example.Notes"}, {9, 9}, plain, done));
+    EXPECT_EQ(calls, (std::vector<std::string>{"#org.example.Notes", "done", "#org.example.Notes",
+                                               "done"}));
 }
 
 TEST_P(LocalFileProviderTest, anIdentifierAndAURLLeadToEachOther) {

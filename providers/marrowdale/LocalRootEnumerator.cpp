@@ -44,6 +44,16 @@ LocalRootEnumerator::LocalRootEnumerator(const Platform& platform, std::string c
 
 LocalRootEnumerator::~LocalRootEnumerator() {
     LocalRootEnumerator::invalidate();
+    // Whoever drops it wants to hear nothing more, whether or not it was started.
+    std::vector<std::shared_ptr<LocalFileEnumerator>> silenced;
+    {
+        const std::lock_guard lock(mutex_);
+        std::swap(silenced, replaced_);
+        silenced.push_back(localFileEnumerator_);
+    }
+    for (const auto& enumerator : silenced) {
+        enumerator->invalidate();
+    }
 }
 
 void LocalRootEnumerator::enumerateItemsForObserver(FileProviderEnumerationObserver& observer,
@@ -222,16 +232,6 @@ void LocalRootEnumerator::stop() noexcept {
 
 void LocalRootEnumerator::invalidate() noexcept {
     stop();
-    // Whoever invalidates wants to hear nothing more, whether or not this was started.
-    std::vector<std::shared_ptr<LocalFileEnumerator>> silenced;
-    {
-        const std::lock_guard lock(mutex_);
-        std::swap(silenced, replaced_);
-        silenced.push_back(localFileEnumerator_);
-    }
-    for (const auto& enumerator : silenced) {
-        enumerator->invalidate();
-    }
 }
 
 std::shared_ptr<LocalFileEnumerator> LocalRootEnumerator::localFileEnumerator() const {

@@ -29,7 +29,7 @@ class LocalRootEnumerator : public FileProviderEnumerator {
     LocalRootEnumerator(const Platform& platform, std::string container);
     LocalRootEnumerator(const LocalRootEnumerator&) = delete;
     LocalRootEnumerator& operator=(const LocalRootEnumerator&) = delete;
-    // Invalidates, if nobody did.
+    // Ends what is under way, whether or not this was started: its observers hear nothing more.
     ~LocalRootEnumerator() override;
 
     // An initial page begins with one batch of all app libraries.
@@ -42,9 +42,12 @@ class LocalRootEnumerator : public FileProviderEnumerator {
         const std::function<void(const std::optional<Data>&)>& completionHandler) noexcept override;
     void start() noexcept override;
     void stop() noexcept override;
+    // The same as `stop`; nothing for one that was not started.
     void invalidate() noexcept override;
 
     [[nodiscard]] const std::string& container() const { return container_; }
+    // "marrowdale.root-enumerator.queue"; on it versions are decided about.
+    [[nodiscard]] const SerialQueue& enumQueue() const { return enumQueue_; }
     [[nodiscard]] const LocalAppLibraryManager& appLibraryManager() const {
         return *appLibraryManager_;
     }

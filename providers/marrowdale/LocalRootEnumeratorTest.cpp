@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <cerrno>
 #include <filesystem>
 
@@ -332,6 +333,58 @@ TEST_F(LocalRootEnumeratorTest, aRunningOneFollowsTheNewFolders) {
     drain(*replaced);
     drain(*second->localFileEnumerator());
     drain(*made->localFileEnumerator());
+}
+
+TEST_F(LocalRootEnumeratorTest, invalidateIsStopAndDoesNothingToOneThatIsNotStarted) {
+    add("A");
+    refreshAll();
+    const auto made = enumerator();
+    made->invalidate();
+    made->stop();
+    made->invalidate();
+    EXPECT_EQ(changes(*made, anchorWithVersion(0)), (Calls{"update #org.example.A", "finish"}));
+    // Nor does it close one that was.
+    made->start();
+    made->invalidate();
+    EXPECT_EQ(changes(*made, anchorWithVersion(1)), Calls{"finish"});
+    drain(*made->localFileEnumerator());
+}
+
+TEST_F(LocalRootEnumeratorTest, row5TellsInItsOrder) {
+    add("A");
+    refreshAll();
+    const auto made = enumerator();
+    remove("A");
+    add("B");
+    const Data anchor = anchorWithVersion(1);
+    refreshAll();
+    world_.sink->clear();
+    writeFile(world_.path("new.txt"), "");
+    const Calls calls = changes(*made, anchor);
+    // Libraries, those that are gone, files, the end.
+    ASSERT_EQ(calls.size(), 4U);
+    EXPECT_EQ(calls[0], "update #org.example.B");
+    EXPECT_EQ(calls[1], "delete #org.example.A");
+    EXPECT_TRUE(calls[2].starts_with("update did="));
+    EXPECT_EQ(calls[3], "finish");
+    const auto lines = world_.sink->lines();
+    const auto placeOf = [&](std::string_view text) {
+        const auto found = std::ranges::find_if(
+            lines, [&](const std::string& line) { return line.contains(text); });
+        EXPECT_NE(found, lines.end()) << text;
+        return found - lines.begin();
+    };
+    const std::vector<std::ptrdiff_t> places{placeOf(" enumerate root changes for "),
+                                             placeOf("notifying app library changes since "),
+                                             placeOf(matchesLine),
+                                             placeOf("upgrading content from main cache"),
+                                             placeOf("upgraded manager "),
+                                             placeOf("updated root enumerator to monitor [")};
+    EXPECT_TRUE(std::ranges::is_sorted(places));
+}
+
+TEST_F(LocalRootEnumeratorTest, itsQueueIsNamed) {
+    EXPECT_EQ(enumerator()->enumQueue().label(), "marrowdale.root-enumerator.queue");
 }
 
 TEST_F(LocalRootEnumeratorTest, whatHappensInALibraryReachesTheWorkingSetsFeed) {

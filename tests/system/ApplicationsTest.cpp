@@ -1,6 +1,7 @@
 // Which applications are served, and how a program asks for them.
 
 #include <filesystem>
+#include <random>
 #include <sys/stat.h>
 #include <tuple>
 
@@ -267,6 +268,29 @@ TEST_F(ApplicationsTest, programsAskForPicturesAndRefreshesOverTheSocket) {
     }
 }
 
+TEST_F(ApplicationsTest, theExampleOfTheClientLibraryShowsLibrariesAndIcons) {
+    home_.install(notes, "Notes");
+    const Service service(home_);
+    EXPECT_EQ(apps().size(), 1U);
+    home_.install(sketch, "Sketch");
+    makeFolder(home_.path("out"));
+    ChildOptions options = home_.command({});
+    options.arguments = {programFolder() + "/marrowdale_example_icons", home_.path("out")};
+    const ChildResult result = runChild(options);
+    EXPECT_EQ(result.exitCode, 0) << result.errors;
+    std::string expected;
+    for (const auto& [identifier, name] :
+         {std::pair(notes, "Notes"), std::pair(sketch, "Sketch")}) {
+        const std::string picture = readFile(home_.path("out/#" + identifier + ".png"));
+        EXPECT_TRUE(picture.starts_with("\x89PNG")) << identifier;
+        expected += std::string(name) + "\t" + home_.library(identifier) + "\t" +
+                    std::to_string(picture.size()) + "\n";
+    }
+    EXPECT_EQ(result.output, expected);
+    options.arguments[1] = home_.path("none");
+    EXPECT_THAT(runChild(options).errors, HasSubstr("can't write"));
+}
+
 TEST_F(ApplicationsTest, aServiceKnowsWhatARefreshFoundWhenTheCommandReturns) {
     const Service service(home_);
     EXPECT_THAT(apps(), IsEmpty());
@@ -323,6 +347,48 @@ TEST_F(ApplicationsTest, entriesThatAreNoEntriesStopNothing) {
     ASSERT_EQ(::mkfifo(home_.entry("org.example.Pipe").c_str(), 0600), 0);
     fs::create_symlink("nowhere", home_.entry("org.example.Dangling"));
     EXPECT_THAT(apps(), ElementsAre("#" + notes));
+}
+
+TEST_F(ApplicationsTest, aKillAtAnyMomentLeavesTheRightPictureForTheNext) {
+    std::mt19937 random(5);
+    home_.install(notes, "Notes");
+    EXPECT_THAT(apps(), ElementsAre("#" + notes));
+    for (int round = 0; round < 12; ++round) {
+        const bool isThere = round % 2 == 0;
+        if (isThere) {
+            home_.install(sketch, "Sketch");
+        } else {
+            fs::remove(home_.entry(sketch));
+        }
+        ChildProcess process(home_.command({"apps"}));
+        // Nothing is read, so this is a wait that the process may end early.
+        (void)process.readOutput(SIZE_MAX, std::chrono::milliseconds(random() % 80));
+        process.kill();
+        (void)process.finish();
+        const std::vector<std::string> expected =
+            isThere ? std::vector{"#" + notes, "#" + sketch} : std::vector{"#" + notes};
+        EXPECT_EQ(apps(), expected) << round;
+        EXPECT_EQ(field(home_.lines({"ls"}), "itemIdentifier"), expected) << round;
+    }
+}
+
+TEST_F(ApplicationsTest, aByteOfAnotherValueInACacheIsMendedByTheNextStart) {
+    home_.install(notes, "Notes");
+    home_.install(sketch, "Sketch");
+    const auto all = std::vector{"#" + notes, "#" + sketch};
+    EXPECT_EQ(apps(), all);
+    for (const char* name : {"app-libraries.plist", "searchable-app-libraries.plist"}) {
+        const std::string cache = home_.path(".local/share/Marrowdale/" + std::string(name));
+        const std::string whole = readFile(cache);
+        for (std::size_t at = 3; at < whole.size(); at += whole.size() / 8) {
+            std::string damaged = readFile(cache);
+            damaged[at % damaged.size()] = static_cast<char>(damaged[at % damaged.size()] ^ 4);
+            writeFile(cache, damaged);
+            EXPECT_EQ(apps(), all) << name << " " << at;
+            EXPECT_EQ(home_.line({"id", home_.library(sketch)}).at("itemIdentifier"), "#" + sketch)
+                << name << " " << at;
+        }
+    }
 }
 
 TEST_F(ApplicationsTest, damagedCachesAreMadeAnew) {

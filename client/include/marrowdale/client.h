@@ -125,6 +125,17 @@ class Service {
     // Items whose name or a tag contains every word.
     [[nodiscard]] Result<std::vector<Item>> search(const std::vector<std::string>& words);
 
+    // The document libraries of applications, which also stand in the root.
+    [[nodiscard]] Result<std::vector<Item>> applications();
+    // The library of one application, listed or not. "invalidParameter" where there is none.
+    [[nodiscard]] Result<Item> application(std::string_view bundleIdentifier);
+    // Looks at the applications of the system again, and returns when what was installed before
+    // the call is known. A service does so by itself a moment after something changed.
+    [[nodiscard]] Result<void> refreshApplications();
+    // A picture of the item as PNG, in the size that suits the screen: an application's library
+    // has its icon. None for other items.
+    [[nodiscard]] Result<std::optional<std::string>> thumbnail(std::string_view identifier);
+
   private:
     class Connection;
     explicit Service(std::unique_ptr<Connection> connection);

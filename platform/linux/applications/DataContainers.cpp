@@ -37,15 +37,26 @@ DataContainers::DataContainers(const std::string& folder, const std::string& sto
     }
 }
 
+Expected<UniqueFD> DataContainers::open() const {
+    if (folder_.empty()) {
+        return Unexpected(errorWithPOSIXCode(ENOENT, "look for the containers in", folder_));
+    }
+    return holdFolder(folder_);
+}
+
 DataContainers::Container DataContainers::containerOf(std::string_view identifier) const {
+    return containerIn(open(), identifier);
+}
+
+DataContainers::Container DataContainers::containerIn(const Expected<UniqueFD>& folder,
+                                                      std::string_view identifier) const {
     if (folder_.empty() || identifier.empty() || identifier.contains('/')) {
         return {};
     }
     const std::string path = folder_ + "/" + std::string(identifier);
-    const auto top = holdFolder(folder_);
-    const auto documents = top ? holdFolderBeneath(top->get(), std::string(identifier) + "/" +
-                                                                   std::string(documentsName))
-                               : Unexpected(top.error());
+    const auto documents = folder ? holdFolderBeneath(folder->get(), std::string(identifier) + "/" +
+                                                                         std::string(documentsName))
+                                  : Unexpected(folder.error());
     if (!documents) {
         const int code = documents.error().code;
         if (code == EXDEV) {

@@ -7,6 +7,7 @@
 
 #include "platform/foundation/Error.h"
 #include "platform/foundation/Identifiers.h"
+#include "platform/linux/files/UniqueFD.h"
 
 namespace marrowdale::native {
 
@@ -37,6 +38,12 @@ class DataContainers {
         FileID documents{};  // which folder its "Documents" is; the same
     };
     [[nodiscard]] Container containerOf(std::string_view identifier) const;
+
+    // The folder of all containers as it stands now, for questions that come together.
+    [[nodiscard]] Expected<UniqueFD> open() const;
+    // The same as `containerOf` with a folder that was opened by this.
+    [[nodiscard]] Container containerIn(const Expected<UniqueFD>& folder,
+                                        std::string_view identifier) const;
 
     // The identifier whose container, or documents folder, the path is; none for other paths. The
     // disk is not asked.

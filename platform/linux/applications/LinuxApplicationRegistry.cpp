@@ -40,9 +40,17 @@ bool isServed(const DesktopEntry& entry) {
 struct LinuxApplicationRegistry::Scan {
     DesktopEntryFolders::Entries entries;
     DataContainers containers;
-    std::vector<DocumentsFolder> documentFolders;
-    std::vector<std::string> packageExtensions;
-    std::vector<Refused> refused;
+    // Of those who want their documents served.
+    std::map<std::string, DataContainers::Container, std::less<>> found = {};
+    std::vector<DocumentsFolder> documentFolders = {};
+    std::vector<std::string> packageExtensions = {};
+    std::vector<Refused> refused = {};
+
+    // As it was when it was looked for, else as it is.
+    [[nodiscard]] DataContainers::Container containerOf(std::string_view identifier) const {
+        const auto known = found.find(identifier);
+        return known == found.end() ? containers.containerOf(identifier) : known->second;
+    }
 
     [[nodiscard]] std::vector<std::string> documentPaths() const {
         std::vector<std::string> paths;
@@ -68,11 +76,18 @@ struct LinuxApplicationRegistry::Reader {
     }
 };
 
-// Names an application; what it says is looked up when it is asked.
+// Names an application; what it says is looked up when it is asked. Made with a reading in which it
+// is, it answers from that until the reading is over.
 class LinuxApplicationRegistry::Record final : public BundleRecord {
   public:
-    Record(LinuxApplicationRegistry& registry, std::string identifier)
-        : registry_(registry), identifier_(std::move(identifier)) {}
+    Record(LinuxApplicationRegistry& registry, std::string identifier,
+           std::shared_ptr<const Scan> reading = nullptr)
+        : registry_(registry), identifier_(std::move(identifier)), reading_(std::move(reading)) {}
+
+    void endReading() {
+        const std::lock_guard lock(mutex_);
+        reading_ = nullptr;
+    }
 
     std::optional<std::string> bundleIdentifier() const override {
         return identifier_.empty() ? std::nullopt : std::optional(identifier_);
@@ -82,10 +97,12 @@ class LinuxApplicationRegistry::Record final : public BundleRecord {
         return found ? found->name : std::nullopt;
     }
     std::optional<URL> dataContainerURL() const override {
-        if (!isInstalled()) {
+        const auto known = reading();
+        if (!known && !isInstalled()) {
             return std::nullopt;
         }
-        const auto container = registry_.scan()->containers.containerOf(identifier_);
+        const auto container = known ? known->containerOf(identifier_)
+                                     : registry_.scan()->containers.containerOf(identifier_);
         return container.refusal == Refusal::none ? std::optional(URL::fileURL(container.path))
                                                   : std::nullopt;
     }
@@ -118,8 +135,16 @@ class LinuxApplicationRegistry::Record final : public BundleRecord {
     }
 
   private:
+    [[nodiscard]] std::shared_ptr<const Scan> reading() const {
+        const std::lock_guard lock(mutex_);
+        return reading_;
+    }
     // The file that was found last, as it is now; when it is gone, whatever takes its place.
     bool lookUp(std::shared_ptr<const DesktopEntry>& found) const {
+        if (const auto known = reading()) {
+            found = known->entries.find(identifier_)->second.entry;
+            return true;
+        }
         if (lookUpIn(*registry_.scan(), found)) {
             return true;
         }
@@ -139,6 +164,8 @@ class LinuxApplicationRegistry::Record final : public BundleRecord {
 
     LinuxApplicationRegistry& registry_;
     const std::string identifier_;
+    mutable std::mutex mutex_;
+    std::shared_ptr<const Scan> reading_;  // guarded by mutex_
 };
 
 LinuxApplicationRegistry::LinuxApplicationRegistry(LinuxApplicationRegistryOptions options)
@@ -151,10 +178,8 @@ std::shared_ptr<const LinuxApplicationRegistry::Scan> LinuxApplicationRegistry::
     const std::lock_guard turn(scanning_);
     auto scan = std::make_shared<Scan>(
         Scan{.entries = reader_->read(options_.places.folders),
-             .containers = DataContainers(options_.places.containersFolder, options_.storageRoot),
-             .documentFolders = {},
-             .packageExtensions = {},
-             .refused = {}});
+             .containers = DataContainers(options_.places.containersFolder, options_.storageRoot)});
+    const auto containersFolder = scan->containers.open();
     for (const auto& [identifier, found] : scan->entries) {
         if (!found.entry || found.entry->info.empty()) {
             continue;
@@ -164,7 +189,8 @@ std::shared_ptr<const LinuxApplicationRegistry::Scan> LinuxApplicationRegistry::
         if (!isServed(*found.entry)) {
             continue;
         }
-        auto container = scan->containers.containerOf(identifier);
+        const auto container = scan->containers.containerIn(containersFolder, identifier);
+        scan->found.emplace(identifier, container);
         if (container.refusal == Refusal::none) {
             scan->documentFolders.emplace_back(container.path + "/" + std::string(documentsName),
                                                container.documents);
@@ -219,9 +245,12 @@ std::shared_ptr<const BundleRecord> LinuxApplicationRegistry::record(std::string
 
 void LinuxApplicationRegistry::enumerateApplications(ApplicationKind kind,
                                                      const RecordBlock& block) {
-    for (const auto& [identifier, found] : rescan()->entries) {
+    const auto reading = kind == ApplicationKind::user ? rescan() : scan();
+    for (const auto& [identifier, found] : reading->entries) {
         if (found.kind == kind) {
-            block(record(identifier));
+            const auto each = std::make_shared<Record>(*this, identifier, reading);
+            block(each);
+            each->endReading();
         }
     }
 }
@@ -279,6 +308,10 @@ std::vector<std::string> LinuxApplicationRegistry::documentFolders() {
 
 std::vector<std::string> LinuxApplicationRegistry::packageExtensions() {
     return rescan()->packageExtensions;
+}
+
+std::vector<std::string> LinuxApplicationRegistry::knownPackageExtensions() {
+    return scan()->packageExtensions;
 }
 
 std::vector<LinuxApplicationRegistry::Refused> LinuxApplicationRegistry::refusedLibraries() const {

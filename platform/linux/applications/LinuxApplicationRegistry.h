@@ -31,9 +31,11 @@ struct LinuxApplicationRegistryOptions {
     std::function<void(const std::vector<std::string>& paths)> documentFoldersChanged;
 };
 
-// The applications of this system, from their desktop entries. Each enumeration reads the folders
-// anew, but for files that are as they were; what a record is asked is answered from its file as it
-// is then. Any thread.
+// The applications of this system, from their desktop entries. An enumeration of the user's
+// applications reads the folders anew, but for files that are as they were; one of the system's
+// tells what was read last, so both together are one picture. What a record is asked is answered
+// from its file as it is then, but by the block that it is handed to: there as it was read. Any
+// thread.
 //
 // A record outlives the registry's changes, not the registry.
 class LinuxApplicationRegistry final : public ApplicationRegistry {
@@ -54,8 +56,10 @@ class LinuxApplicationRegistry final : public ApplicationRegistry {
     // The documents folders of the applications that want theirs served, sorted. No others: one
     // that comes to be served is new then, with all that is in it. Reads the registry anew.
     [[nodiscard]] std::vector<std::string> documentFolders();
-    // What such applications declare as the extensions of packages, sorted.
+    // What applications declare as the extensions of packages, sorted. Reads the registry anew.
     [[nodiscard]] std::vector<std::string> packageExtensions();
+    // The same as of the last reading.
+    [[nodiscard]] std::vector<std::string> knownPackageExtensions();
 
     // An application whose documents can't be served, and why.
     struct Refused {

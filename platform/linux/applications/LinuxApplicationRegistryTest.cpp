@@ -66,6 +66,33 @@ TEST_F(LinuxApplicationRegistryTest, anEntryThatSaysHiddenHidesTheSystemsToo) {
     EXPECT_EQ(nameOf("org.example.A"), "no record");
 }
 
+TEST_F(LinuxApplicationRegistryTest, bothKindsTellOfOneReading) {
+    writeFile(userEntry("org.example.A"), entry("A"));
+    EXPECT_EQ(identifiers(registry_, user), Names{"org.example.A"});
+    // Neither twice nor not at all, though it goes from one folder to the other in between.
+    std::filesystem::rename(userEntry("org.example.A"), systemEntry("org.example.A"));
+    EXPECT_TRUE(identifiers(registry_, system).empty());
+    EXPECT_TRUE(identifiers(registry_, user).empty());
+    EXPECT_EQ(identifiers(registry_, system), Names{"org.example.A"});
+}
+
+TEST_F(LinuxApplicationRegistryTest, whatABlockIsHandedAnswersAsItWasRead) {
+    writeFile(userEntry("org.example.A"), entry("A", "X-KvFileSharingEnabled=true\n"));
+    makeContainer("org.example.A");
+    std::shared_ptr<const BundleRecord> kept;
+    registry_.enumerateApplications(user, [&](const auto& record) {
+        kept = record;
+        std::filesystem::remove(userEntry("org.example.A"));
+        std::filesystem::remove_all(container("org.example.A"));
+        EXPECT_EQ(record->localizedName(), "A");
+        EXPECT_TRUE(record->fileSharingEnabled());
+        EXPECT_EQ(record->dataContainerURL(), URL::fileURL(container("org.example.A")));
+    });
+    ASSERT_TRUE(kept);
+    EXPECT_EQ(kept->localizedName(), std::nullopt);
+    EXPECT_EQ(kept->dataContainerURL(), std::nullopt);
+}
+
 TEST_F(LinuxApplicationRegistryTest, whatIsNotShownInMenusIsAnApplicationAllTheSame) {
     writeFile(userEntry("org.example.A"), entry("A", "NoDisplay=true\n"));
     writeFile(userEntry("org.example.Link"), "[Desktop Entry]\nType=Link\nName=L\n");

@@ -18,11 +18,6 @@ std::string withoutTrailingSlashes(std::string path) {
     return path;
 }
 
-// `folder` is without a slash at its end, so empty for the file system's root.
-bool contains(std::string_view folder, std::string_view path) {
-    return path.starts_with(folder) && (path.size() == folder.size() || path[folder.size()] == '/');
-}
-
 Error notServed(const std::string& path) {
     return errorWithPOSIXCode(ENOENT, "look in the served folders for", path);
 }
@@ -45,27 +40,40 @@ ServedTrees::ServedTrees(const std::vector<std::string>& rootFolders,
             private_.push_back(std::move(folder));
         }
     }
+    const Above above = abovePrivateFolders();
     for (const std::string& path : rootFolders) {
-        roots_.push_back(openRoot(path));
+        auto root = openRoot(path, above);
+        std::string name = root->path;
+        roots_.emplace(std::move(name), std::move(root));
     }
 }
 
-std::shared_ptr<const ServedTrees::Folder> ServedTrees::openRoot(const std::string& path) const {
+// Where it can't be known, private folders count as lying below, which only costs time.
+std::shared_ptr<const ServedTrees::Folder> ServedTrees::openRoot(const std::string& path,
+                                                                 const Above& above) {
     auto root = std::make_shared<Folder>(open(path));
     root->path = withoutTrailingSlashes(path);
-    root->holdsPrivateFolders = std::ranges::any_of(
-        private_, [&](const Folder& folder) { return liesBelow(folder, *root); });
+    root->holdsPrivateFolders =
+        root->held && (!above.isWhole ||
+                       std::ranges::any_of(above.folders,
+                                           [&](const auto& folder) { return root->isAt(folder); }));
     return root;
 }
 
 void ServedTrees::setRoots(const std::vector<std::string>& rootFolders) {
-    std::vector<std::shared_ptr<const Folder>> roots;
+    Roots roots;
+    std::optional<Above> above;
     for (const std::string& path : rootFolders) {
+        std::string name = withoutTrailingSlashes(path);
         auto known = rootOf(path);
         const auto stands = statEntry(AT_FDCWD, path.c_str());
-        const bool isSame = known != nullptr && known->path == withoutTrailingSlashes(path) &&
-                            stands && known->isAt(*stands);
-        roots.push_back(isSame ? std::move(known) : openRoot(path));
+        const bool isSame =
+            known != nullptr && known->path == name && stands && known->isAt(*stands);
+        if (!isSame) {
+            above = above ? std::move(above) : abovePrivateFolders();
+            known = openRoot(path, *above);
+        }
+        roots.emplace(std::move(name), std::move(known));
     }
     const std::lock_guard lock(mutex_);
     roots_ = std::move(roots);
@@ -90,37 +98,38 @@ ServedTrees::Folder ServedTrees::open(const std::string& path) {
     return folder;
 }
 
-// Up to the top; where that can't be reached it counts as lying below, which only costs time.
-bool ServedTrees::liesBelow(const Folder& inner, const Folder& outer) {
-    if (!outer.held) {
-        return false;
-    }
-    UniqueFD at = parentOf(inner.held.get());
-    std::optional<EntryStatus> before;
-    while (at) {
-        const auto status = statEntry(at.get(), "");
-        if (!status || outer.isAt(*status)) {
-            return true;
+ServedTrees::Above ServedTrees::abovePrivateFolders() const {
+    Above above;
+    for (const Folder& folder : private_) {
+        UniqueFD at = parentOf(folder.held.get());
+        std::optional<EntryStatus> below;
+        bool isTop = false;
+        while (at && !isTop) {
+            const auto status = statEntry(at.get(), "");
+            if (!status) {
+                break;
+            }
+            // Above the top is the top.
+            isTop = below && below->fileID == status->fileID && below->device == status->device;
+            below = *status;
+            above.folders.push_back(*status);
+            at = parentOf(at.get());
         }
-        if (before && before->fileID == status->fileID && before->device == status->device) {
-            return false;
-        }
-        before = *status;
-        at = parentOf(at.get());
+        above.isWhole = above.isWhole && isTop;
     }
-    return true;
+    return above;
 }
 
 std::shared_ptr<const ServedTrees::Folder> ServedTrees::rootOf(std::string_view path) const {
     const std::lock_guard lock(mutex_);
-    std::shared_ptr<const Folder> innermost;
-    for (const auto& root : roots_) {
-        if (contains(root->path, path) &&
-            (innermost == nullptr || root->path.size() > innermost->path.size())) {
-            innermost = root;
+    // Up from the path itself; the file system's root is the empty path.
+    for (std::size_t end = path.size(); end != std::string_view::npos;
+         end = end == 0 ? std::string_view::npos : path.rfind('/', end - 1)) {
+        if (const auto root = roots_.find(path.substr(0, end)); root != roots_.end()) {
+            return root->second;
         }
     }
-    return innermost;
+    return nullptr;
 }
 
 Expected<std::optional<ServedTrees::Location>> ServedTrees::locate(std::string_view path) const {

@@ -1,10 +1,12 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <vector>
 
 #include "platform/foundation/Error.h"
@@ -81,13 +83,26 @@ class ServedTrees {
     [[nodiscard]] static Location locationIn(std::shared_ptr<const Folder> root,
                                              std::string_view path);
     [[nodiscard]] static Folder open(const std::string& path);
-    [[nodiscard]] static bool liesBelow(const Folder& inner, const Folder& outer);
-    [[nodiscard]] std::shared_ptr<const Folder> openRoot(const std::string& path) const;
+    // The folders above the private ones, up to the top, as they stand now.
+    struct Above {
+        std::vector<EntryStatus> folders;
+        bool isWhole = true;  // false: some can't be reached
+    };
+    [[nodiscard]] Above abovePrivateFolders() const;
+    [[nodiscard]] static std::shared_ptr<const Folder> openRoot(const std::string& path,
+                                                                const Above& above);
     [[nodiscard]] std::shared_ptr<const Folder> rootOf(std::string_view path) const;
     [[nodiscard]] Expected<UniqueFD> holdInSteps(int root, const std::string& relativePath) const;
 
+    // By path without a slash at the end. There are as many as there are applications, and every
+    // look at a file begins here.
+    struct PathHash : std::hash<std::string_view> {
+        using is_transparent = void;
+    };
+    using Roots =
+        std::unordered_map<std::string, std::shared_ptr<const Folder>, PathHash, std::equal_to<>>;
     mutable std::mutex mutex_;
-    std::vector<std::shared_ptr<const Folder>> roots_;  // guarded by mutex_
+    Roots roots_;  // guarded by mutex_
     std::vector<Folder> private_;
 };
 

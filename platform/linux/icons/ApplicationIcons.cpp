@@ -75,7 +75,8 @@ std::optional<Data> ApplicationIcons::ownIcon(const std::string& icon, unsigned 
             return known->data;
         }
     }
-    const auto path = theme()->find(icon, pixels);
+    // Of a file that is named itself no theme knows anything.
+    const auto path = icon.starts_with('/') ? std::optional(icon) : theme()->find(icon, pixels);
     const auto signature = path ? signatureOf(*path) : std::nullopt;
     if (!signature) {
         return std::nullopt;

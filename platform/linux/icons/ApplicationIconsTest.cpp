@@ -1,6 +1,12 @@
+#include <array>
 #include <cerrno>
+#include <chrono>
+#include <csignal>
 #include <filesystem>
+#include <functional>
 #include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <gtest/gtest.h>
 
@@ -8,8 +14,10 @@
 #include "platform/linux/icons/BuiltInIcon.h"
 #include "platform/linux/icons/CachedBitmap.h"
 #include "platform/linux/icons/PNG.h"
+#include "platform/testing/ScopedMount.h"
 #include "platform/testing/TemporaryDirectory.h"
 #include "platform/testing/TestFiles.h"
+#include "platform/testing/TestSkip.h"
 
 namespace marrowdale::native {
 namespace {
@@ -166,6 +174,81 @@ TEST_F(ApplicationIconsTest, aDamagedCacheIsDrawnAnew) {
     const auto made = icons();
     EXPECT_EQ(pixelAt(made->iconData("a", 32), 90, 90), red);
     EXPECT_EQ(made->drawn(), 1U);
+}
+
+TEST_F(ApplicationIconsTest, whatIsNoBitmapInTheCacheIsDrawnAnewWithoutWaiting) {
+    put("scalable/apps/a.svg", svg("red"));
+    (void)icons()->iconData("a", 32);
+    const std::string kept =
+        fs::directory_iterator(directory_.path("cache/icons"))->path().string();
+    const std::string whole = readFile(kept);
+    const std::vector<std::function<void()>> kinds{
+        [&] { writeFile(kept, ""); },
+        [&] { writeFile(kept, whole.substr(0, whole.size() - 1)); },
+        [&] { writeFile(kept, whole + "x"); },
+        [&] { ASSERT_EQ(::mkfifo(kept.c_str(), 0600), 0); },
+        [&] { fs::create_symlink("/dev/zero", kept); },
+        [&] { fs::create_directories(kept + "/in the way"); }};
+    for (std::size_t kind = 0; kind < kinds.size(); ++kind) {
+        fs::remove_all(kept);
+        kinds[kind]();
+        const auto made = icons();
+        EXPECT_EQ(pixelAt(made->iconData("a", 32), 90, 90), red) << kind;
+        EXPECT_EQ(made->drawn(), 1U) << kind;
+        const bool isReplaced = fs::is_regular_file(fs::symlink_status(kept));
+        EXPECT_EQ(icons()->iconData("a", 32).has_value(), true) << kind;
+        EXPECT_EQ(isReplaced, kind + 1 < kinds.size()) << kind;
+    }
+    // Nothing was left beside it.
+    EXPECT_EQ(std::distance(fs::directory_iterator(directory_.path("cache/icons")),
+                            fs::directory_iterator()),
+              1);
+}
+
+TEST_F(ApplicationIconsTest, aFullDiskKeepsNoIconAndNoPartOfOne) {
+    put("scalable/apps/a.svg", svg("red"));
+    const std::string cache = directory_.path("cache");
+    makeFolder(cache);
+    const auto disk = ScopedMount::memory(cache, "size=64k");
+    if (!disk) {
+        MARROWDALE_SKIP_FOR_USER("only root may mount");
+    }
+    const auto made = icons();
+    EXPECT_EQ(pixelAt(made->iconData("a", 32), 90, 90), red);  // 130 KB
+    EXPECT_TRUE(fs::is_empty(cache + "/icons"));
+    EXPECT_EQ(pixelAt(made->iconData("a", 0), 30, 30), red);  // 15 KB
+    EXPECT_FALSE(fs::is_empty(cache + "/icons"));
+}
+
+TEST_F(ApplicationIconsTest, aKillAtAnyMomentLeavesAWholeIconOrNone) {
+    const Data bitmap = *cachedBitmapWithImage(
+        {.width = 180, .height = 180, .pixels = Data(Bytes(std::size_t{4} * 180 * 180, 7))});
+    const IconCache cache(directory_.path("cache/icons"));
+    for (int round = 0; round < 40; ++round) {
+        std::array<int, 2> ends{};
+        ASSERT_EQ(::pipe(ends.data()), 0);
+        const pid_t child = ::fork();
+        if (child == 0) {
+            for (;;) {
+                cache.keep("key", bitmap);
+                (void)!::write(ends[1], "k", 1);
+            }
+        }
+        ASSERT_GT(child, 0);
+        ::close(ends[1]);
+        // Some way into the saving that follows the first.
+        char kept = 0;
+        ASSERT_EQ(::read(ends[0], &kept, 1), 1);
+        const auto until = std::chrono::steady_clock::now() + std::chrono::microseconds(round * 9);
+        while (std::chrono::steady_clock::now() < until) {
+        }
+        ::kill(child, SIGKILL);
+        ::waitpid(child, nullptr, 0);
+        ::close(ends[0]);
+        const auto found = cache.find("key");
+        ASSERT_TRUE(found) << round;  // one was whole before
+        ASSERT_EQ(*found, bitmap) << round;
+    }
 }
 
 TEST_F(ApplicationIconsTest, aCacheThatCantBeWrittenCostsNothingElse) {

@@ -5,13 +5,14 @@
 #include <cerrno>
 #include <span>
 #include <string_view>
-#include <zlib.h>
+
+#include "platform/linux/files/CRC32C.h"
 
 namespace marrowdale::native {
 
 namespace {
 
-constexpr std::string_view magic = "mrwbmp1\n";
+constexpr std::string_view magic = "mrwbmp2\n";
 constexpr std::size_t widthAt = 8;
 constexpr std::size_t heightAt = 12;
 constexpr std::size_t checksumAt = 16;
@@ -34,9 +35,8 @@ std::uint32_t get32(std::span<const std::uint8_t> bytes, std::size_t at) {
 
 // Over everything but itself.
 std::uint32_t checksum(std::span<const std::uint8_t> bytes) {
-    const uLong header = ::crc32_z(0, bytes.data(), checksumAt);
-    const auto pixels = bytes.subspan(pixelsAt);
-    return static_cast<std::uint32_t>(::crc32_z(header, pixels.data(), pixels.size()));
+    const std::uint32_t header = crc32c(std::as_bytes(bytes.first(checksumAt)));
+    return crc32c(std::as_bytes(bytes.subspan(pixelsAt)), header);
 }
 
 bool isSide(std::uint32_t side) {
@@ -63,18 +63,20 @@ Expected<Data> cachedBitmapWithImage(const Image& image) {
     return Data(std::move(bytes));
 }
 
-Expected<Image> imageWithCachedBitmap(const Data& data) {
+bool isCachedBitmap(const Data& data) {
     const auto bytes = data.bytes();
-    const bool isWhole =
-        bytes.size() >= pixelsAt && std::ranges::equal(bytes.first(widthAt), magic) &&
-        isImage(get32(bytes, widthAt), get32(bytes, heightAt), bytes.size() - pixelsAt) &&
-        get32(bytes, checksumAt) == checksum(bytes);
-    if (!isWhole) {
+    return bytes.size() >= pixelsAt && std::ranges::equal(bytes.first(widthAt), magic) &&
+           isImage(get32(bytes, widthAt), get32(bytes, heightAt), bytes.size() - pixelsAt) &&
+           get32(bytes, checksumAt) == checksum(bytes);
+}
+
+Expected<Image> imageWithCachedBitmap(const Data& data) {
+    if (!isCachedBitmap(data)) {
         return Unexpected(errorWithPOSIXCode(EBADMSG, "read a bitmap", ""));
     }
-    return Image{.width = get32(bytes, widthAt),
-                 .height = get32(bytes, heightAt),
-                 .pixels = Data::copyOf(bytes.subspan(pixelsAt))};
+    return Image{.width = get32(data.bytes(), widthAt),
+                 .height = get32(data.bytes(), heightAt),
+                 .pixels = Data::copyOf(data.bytes().subspan(pixelsAt))};
 }
 
 }  // namespace marrowdale::native

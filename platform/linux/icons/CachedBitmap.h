@@ -15,6 +15,8 @@ inline constexpr std::uint32_t largestBitmapSide = 1024;
 // EINVAL for an image without pixels, with a side beyond the largest one, or with another number of
 // bytes than its sides ask for.
 [[nodiscard]] Expected<Data> cachedBitmapWithImage(const Image& image);
+// Whether it is a whole bitmap.
+[[nodiscard]] bool isCachedBitmap(const Data& data);
 // EBADMSG for anything that is not a whole bitmap.
 [[nodiscard]] Expected<Image> imageWithCachedBitmap(const Data& data);
 

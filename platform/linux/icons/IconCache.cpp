@@ -61,7 +61,7 @@ std::optional<Data> IconCache::find(std::string_view key) const {
         return std::nullopt;
     }
     auto data = LinuxApplicationSupport({}).read(URL::fileURL(fileFor(key)));
-    return data && imageWithCachedBitmap(*data) ? std::optional(*std::move(data)) : std::nullopt;
+    return data && isCachedBitmap(*data) ? std::optional(*std::move(data)) : std::nullopt;
 }
 
 void IconCache::keep(std::string_view key, const Data& bitmap) const {

@@ -7,7 +7,7 @@
 #include <sys/xattr.h>
 #include <vector>
 
-#include "platform/linux/store/CRC32C.h"
+#include "platform/linux/files/CRC32C.h"
 
 namespace marrowdale::native {
 

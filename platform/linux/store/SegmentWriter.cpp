@@ -5,7 +5,7 @@
 #include <fcntl.h>
 
 #include "platform/linux/store/Bytes.h"
-#include "platform/linux/store/CRC32C.h"
+#include "platform/linux/files/CRC32C.h"
 
 namespace marrowdale::native {
 

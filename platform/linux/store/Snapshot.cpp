@@ -6,7 +6,7 @@
 #include <fcntl.h>
 
 #include "platform/linux/store/Bytes.h"
-#include "platform/linux/store/CRC32C.h"
+#include "platform/linux/files/CRC32C.h"
 #include "platform/linux/store/DiskFile.h"
 #include "platform/linux/store/Envelope.h"
 #include "platform/linux/store/StoreDamage.h"

@@ -10,7 +10,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/linux/store/Bytes.h"
-#include "platform/linux/store/CRC32C.h"
+#include "platform/linux/files/CRC32C.h"
 #include "platform/linux/store/Frame.h"
 #include "platform/linux/store/StoreTestSupport.h"
 

@@ -7,7 +7,7 @@
 #include <span>
 #include <sys/stat.h>
 
-#include "platform/linux/store/CRC32C.h"
+#include "platform/linux/files/CRC32C.h"
 #include "platform/linux/store/DiskFile.h"
 #include "platform/linux/store/IdentifierRange.h"
 #include "platform/linux/store/SegmentWriter.h"

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <fcntl.h>
+#include <set>
 #include <utility>
 
 #include "platform/linux/files/DirectoryReader.h"
@@ -25,6 +26,19 @@ bool meetInOneAnother(std::string_view a, std::string_view b) {
     return isAtOrBelow(a, b) || isAtOrBelow(b, a);
 }
 
+using Paths = std::set<std::string, std::less<>>;
+
+// Whether one of the paths is that one, above it or below it.
+bool meetsOneOf(const Paths& paths, std::string_view path) {
+    for (std::string_view above = path; !above.empty(); above = above.substr(0, above.rfind('/'))) {
+        if (paths.contains(above)) {
+            return true;
+        }
+    }
+    const auto next = paths.lower_bound(std::string(path) + "/");
+    return next != paths.end() && isAtOrBelow(*next, path);
+}
+
 }  // namespace
 
 // Of two that get in each other's way the one with the lower key counts, of two with one key the
@@ -35,13 +49,14 @@ std::vector<Store::Core::WantedLibrary> Store::Core::wantedLibraries(
     const auto repeated = std::ranges::unique(libraries, {}, &LibraryFolder::key);
     libraries.erase(repeated.begin(), repeated.end());
     std::vector<WantedLibrary> wanted;
+    Paths taken;
     for (LibraryFolder& library : libraries) {
-        const bool isInTheWay = std::ranges::any_of(wanted, [&](const WantedLibrary& other) {
-            return !other.isRefused && meetInOneAnother(other.folder.path, library.path);
-        });
-        const bool isRefused = isInTheWay || !isGoodKey(library.key) ||
-                               !library.path.starts_with('/') ||
-                               meetInOneAnother(rootPath, library.path);
+        const bool isRefused = !isGoodKey(library.key) || !library.path.starts_with('/') ||
+                               meetInOneAnother(rootPath, library.path) ||
+                               meetsOneOf(taken, library.path);
+        if (!isRefused) {
+            taken.insert(library.path);
+        }
         wanted.push_back({std::move(library), isRefused});
     }
     return wanted;
@@ -200,16 +215,16 @@ void Store::Core::noteLibraryProblem(const RecordedRoots::Folder& folder,
 }
 
 void Store::Core::retireOthers(std::span<const WantedLibrary> wanted) {
+    std::set<std::string_view> keys;
+    for (const WantedLibrary& library : wanted) {
+        keys.insert(library.folder.key);
+    }
     std::vector<std::pair<RowNumber, std::string>> others;
     {
         const MutexLock lock(mutex_);
         RowNumber child = index_.row(rootRow).firstChild();
         for (; child != noRow; child = index_.row(child).next) {
-            const std::string_view name = index_.name(child);
-            const auto isNamed = [name](const WantedLibrary& library) {
-                return name.substr(1) == library.folder.key;
-            };
-            if (index_.isLibrary(child) && std::ranges::none_of(wanted, isNamed)) {
+            if (index_.isLibrary(child) && !keys.contains(index_.name(child).substr(1))) {
                 const CarriedAttributes& known = index_.attributes(child);
                 others.emplace_back(child, known.empty() ? std::string() : known.front().second);
             }

@@ -25,6 +25,11 @@ class AppRefresh : public std::enable_shared_from_this<AppRefresh> {
     // called from.
     void end();
 
+    // "marrowdale.app-refresh.queue"
+    [[nodiscard]] const SerialQueue& queue() const { return appRefreshQueue_; }
+    // Of the pacer; before the end.
+    [[nodiscard]] const std::string& pacerName() const { return appRefreshPacer_->name(); }
+
   private:
     explicit AppRefresh(const Platform& platform);
     void paceEvent();

@@ -1,4 +1,5 @@
 #include <atomic>
+#include <chrono>
 
 #include "platform/foundation/Semaphore.h"
 #include "platform/hostframework/FileProviderConstants.h"
@@ -74,6 +75,33 @@ TEST_F(AppRefreshTest, tenRequestsAtOnceAreOneOrTwoRefreshesAndALaterOneCallsAll
     EXPECT_TRUE(waitUntil([&] { return laterCalls_ > 0; }));
     EXPECT_GE(calls_, 20);
     EXPECT_EQ(calls_ % 10, 0);
+}
+
+TEST_F(AppRefreshTest, refreshesBeginHalfASecondApartAtLeast) {
+    const auto start = std::chrono::steady_clock::now();
+    begin();
+    for (int i = 0; i < 3; ++i) {
+        refreshNow();
+    }
+    const auto seen = std::chrono::steady_clock::now() - start;
+    const auto apart = static_cast<std::int64_t>(events()) - 1;
+    EXPECT_GE(apart, 2);
+    EXPECT_GE(seen, apart * std::chrono::milliseconds(500));
+}
+
+TEST_F(AppRefreshTest, itsQueueAndItsPacerAreNamed) {
+    begin();
+    EXPECT_EQ(refresh_->queue().label(), "marrowdale.app-refresh.queue");
+    EXPECT_EQ(refresh_->pacerName(), "marrowdale.app-refresh.pacer");
+    std::atomic<bool> isOnQueue = false;
+    std::atomic<int> called = 0;
+    refresh_->request([&] {
+        isOnQueue = refresh_->queue().isCurrent();
+        ++called;
+    });
+    EXPECT_TRUE(waitUntil([&] { return called > 0; }));
+    EXPECT_TRUE(isOnQueue);
+    refresh_->end();  // the handler refers to this test
 }
 
 TEST_F(AppRefreshTest, handlersAreCalledInTheOrderOfTheirRequestsBeforeAnySignal) {

@@ -155,7 +155,8 @@ LocalAppLibraryManager::Content LocalAppLibraryManager::contentOf(
                 [&] { return std::string(complaint) + marrowdale::description(*record); });
             continue;
         }
-        const URL root = item->fileURL;
+        // Without what was learnt of it now.
+        const URL root = URL::fileURL(item->fileURL.path());
         content.bundleProxiesByRootURLs.insert_or_assign(root.path(), AppLibrary{root, record});
         content.appLibrariesByItemIDs.insert_or_assign(item->itemIdentifier, std::move(item));
     }

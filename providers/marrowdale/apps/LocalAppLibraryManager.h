@@ -45,6 +45,8 @@ class LocalAppLibraryManager {
     [[nodiscard]] Changed upgradeFromMainCache(FileProviderChangeObserver* observer,
                                                Searchable searchable);
 
+    // "marrowdale.app-library-manager"; on it the fields change.
+    [[nodiscard]] const SerialQueue& queue() const { return queue_; }
     [[nodiscard]] LocalAppLibraryCacheSource cacheSource() const { return cacheSource_; }
     // The version of the main cache that the rest reflects; 0 when nothing is known yet.
     [[nodiscard]] std::uint64_t versionToken() const;

@@ -1,6 +1,10 @@
 #include <cerrno>
 #include <filesystem>
+#include <mutex>
+#include <thread>
 
+#include "platform/foundation/Semaphore.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/apps/AppsTestWorld.h"
 #include "providers/marrowdale/items/MRWAppLibraryManager.h"
 
@@ -140,6 +144,63 @@ TEST_F(LocalAppLibraryManagerTest, aSearchableUpgradeTakesWhatIsGoneOutOfTheInde
         logTells({"[DEBUG] asking provider manager to delete index from deleted domains",
                   "[DEBUG] items from domains [#org.example.A, #org.example.B] removed from index",
                   "[DEBUG] upgraded manager "}));
+}
+
+// A host whose index takes its time.
+class WaitingManager : public FakeManager {
+  public:
+    using FakeManager::FakeManager;
+    void deleteIndexedItemsInDomains(
+        std::vector<std::string> /*domainIdentifiers*/,
+        std::function<void(const std::optional<Error>&)> completionHandler) override {
+        {
+            const std::lock_guard lock(mutex_);
+            answer_ = std::move(completionHandler);
+        }
+        asked.signal();
+    }
+    void answer() {
+        std::function<void(const std::optional<Error>&)> answer;
+        {
+            const std::lock_guard lock(mutex_);
+            std::swap(answer, answer_);
+        }
+        answer(std::nullopt);
+    }
+    Semaphore asked;
+
+  private:
+    std::mutex mutex_;
+    std::function<void(const std::optional<Error>&)> answer_;  // guarded by mutex_
+};
+
+TEST_F(LocalAppLibraryManagerTest, aSearchableUpgradeWaitsForTheIndex) {
+    add("A");
+    (void)refresh();
+    WaitingManager host(world_.root());
+    const Platform platform = withServices(world_.platform, {.manager = &host});
+    LocalAppLibraryManager manager(platform, Source::main);
+    remove("A");
+    (void)refresh();
+    std::thread upgrading(
+        [&] { EXPECT_EQ(manager.upgradeFromMainCache(nullptr, Searchable::yes), Changed::yes); });
+    host.asked.wait();
+    // Until the host answers, the manager is what it was.
+    EXPECT_EQ(manager.versionToken(), 1U);
+    EXPECT_EQ(identifiers(manager), Lines{"#org.example.A"});
+    world_.log.debug([] { return "the host answers"; });
+    host.answer();
+    upgrading.join();
+    EXPECT_EQ(manager.versionToken(), 2U);
+    EXPECT_TRUE(logTells({"[DEBUG] asking provider manager to delete index", "the host answers",
+                          "[DEBUG] items from domains [#org.example.A] removed from index",
+                          "[DEBUG] upgraded manager "}));
+}
+
+TEST_F(LocalAppLibraryManagerTest, itsQueuesAreNamed) {
+    EXPECT_EQ(shared().queue().label(), "marrowdale.app-library-manager");
+    EXPECT_EQ(LocalAppLibraryManager::backgroundQueue(world_.platform).label(),
+              "marrowdale.app-library.background");
 }
 
 TEST_F(LocalAppLibraryManagerTest, aSearchableUpgradeWithoutDeletionsLeavesTheIndexAlone) {

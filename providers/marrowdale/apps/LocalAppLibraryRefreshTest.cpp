@@ -1,6 +1,11 @@
 #include <cerrno>
 #include <filesystem>
+#include <fstream>
+#include <functional>
+#include <sys/stat.h>
 
+#include "platform/testing/ScopedMount.h"
+#include "platform/testing/TestSkip.h"
 #include "providers/marrowdale/apps/AppsTestWorld.h"
 
 namespace marrowdale {
@@ -151,6 +156,77 @@ TEST_F(LocalAppLibraryRefreshTest, aDamagedCacheIsRebuiltByTheNextRefresh) {
         EXPECT_EQ(token(), 1U);
         EXPECT_EQ(cached(), Lines{"org.example.A"});
     }
+}
+
+// Whatever a damaged list is taken for, the next refresh and upgrade have the right one.
+TEST_F(LocalAppLibraryRefreshTest, anyByteOfTheCacheMayBeAnother) {
+    add("A");
+    add("B");
+    const Lines all{"org.example.A", "org.example.B"};
+    ASSERT_EQ(refresh(), Changed::yes);
+    const std::string whole = readFile(mainFile());
+    for (std::size_t at = 0; at < whole.size(); ++at) {
+        std::string damaged = whole;
+        damaged[at] = static_cast<char>(damaged[at] ^ (at % 2 == 0 ? 0x01 : 0x80));
+        writeFile(mainFile(), damaged);
+        (void)refresh();
+        ASSERT_EQ(cached(), all) << at;
+        const LocalAppLibraryManager fresh(world_.platform, Source::main);
+        ASSERT_EQ(identifiers(fresh), (Lines{"#org.example.A", "#org.example.B"})) << at;
+        ASSERT_EQ(fresh.versionToken(), token()) << at;
+    }
+}
+
+TEST_F(LocalAppLibraryRefreshTest, whatIsNoFileInTheCachesPlaceIsReplaced) {
+    add("A");
+    ASSERT_EQ(refresh(), Changed::yes);
+    const std::string other = directory_.path("other");
+    const std::vector<std::pair<std::string, std::function<void()>>> kinds{
+        {"a pipe", [this] { ASSERT_EQ(::mkfifo(mainFile().c_str(), 0600), 0); }},
+        {"a link to nothing", [this] { std::filesystem::create_symlink("nothing", mainFile()); }},
+        {"a link to another file",
+         [&] {
+             writeFile(other, "left alone");
+             std::filesystem::create_symlink(other, mainFile());
+         }},
+        {"an endless file", [this] { std::filesystem::create_symlink("/dev/zero", mainFile()); }}};
+    for (const auto& [kind, make] : kinds) {
+        std::filesystem::remove(mainFile());
+        make();
+        EXPECT_EQ(refresh(), Changed::yes) << kind;
+        EXPECT_TRUE(std::filesystem::is_regular_file(std::filesystem::symlink_status(mainFile())))
+            << kind;
+        EXPECT_EQ(token(), 1U) << kind;
+        EXPECT_EQ(cached(), Lines{"org.example.A"}) << kind;
+    }
+    EXPECT_EQ(readFile(other), "left alone");
+}
+
+TEST_F(LocalAppLibraryRefreshTest, onAFullDiskTheOldListStaysUntilThereIsRoom) {
+    const std::string folder = std::filesystem::path(mainFile()).parent_path();
+    makeFolder(folder);
+    const auto disk = ScopedMount::memory(folder, "size=64k");
+    if (!disk) {
+        MARROWDALE_SKIP_FOR_USER("only root may mount");
+    }
+    add("A");
+    ASSERT_EQ(refresh(), Changed::yes);
+    const std::string filler = folder + "/filler";
+    {
+        std::ofstream out(filler, std::ios::binary);
+        for (int i = 0; i < 64 && out; ++i) {
+            out << std::string(4096, 'x') << std::flush;
+        }
+    }
+    add("B");
+    EXPECT_EQ(refresh(), Changed::no);
+    EXPECT_EQ(countContaining("[ERROR] can't refresh app libraries; "), 1U);
+    EXPECT_EQ(token(), 1U);
+    EXPECT_EQ(cached(), Lines{"org.example.A"});
+    std::filesystem::remove(filler);
+    EXPECT_EQ(refresh(), Changed::yes);
+    EXPECT_EQ(token(), 2U);
+    EXPECT_EQ(cached(), (Lines{"org.example.A", "org.example.B"}));
 }
 
 TEST_F(LocalAppLibraryRefreshTest, aThousandApplicationsAreKept) {

@@ -4,6 +4,7 @@
 #include <variant>
 
 #include "platform/hostframework/FileProviderConstants.h"
+#include "providers/marrowdale/items/ItemLook.h"
 #include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
 
 namespace marrowdale {
@@ -30,8 +31,8 @@ std::shared_ptr<LocalAppLibraryItem> LocalAppLibraryItem::initFrom(const Platfor
         platform.log.error("can't create an app library item without a data container URL");
         return nullptr;
     }
-    auto item =
-        std::make_shared<LocalAppLibraryItem>(container->appendingPathComponent(documentsName));
+    auto item = std::make_shared<LocalAppLibraryItem>(
+        lookedAt(platform, container->appendingPathComponent(documentsName)));
     const Options options{.customItemID = appLibraryIdentifier(record),
                           .customParentItemID = std::string(VantrelRootContainerItemIdentifier),
                           .customFilename = record.localizedName(),

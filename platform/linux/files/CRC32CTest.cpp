@@ -3,7 +3,7 @@
 
 #include <gtest/gtest.h>
 
-#include "platform/linux/store/CRC32C.h"
+#include "platform/linux/files/CRC32C.h"
 
 namespace marrowdale::native {
 namespace {
@@ -29,6 +29,19 @@ TEST(CRC32CTest, InstructionAndTableAgreeAtEveryLengthAndStart) {
             const auto part = std::span(bytes).subspan(start, length);
             ASSERT_EQ(crc32c(part), crc32cByTable(part)) << start << " " << length;
         }
+    }
+}
+
+// Long runs are summed in lanes.
+TEST(CRC32CTest, InstructionAndTableAgreeOnLongRuns) {
+    std::vector<std::byte> bytes(100'000);
+    for (std::size_t i = 0; i < bytes.size(); ++i) {
+        bytes[i] = static_cast<std::byte>(i * i / 3 + i / 11);
+    }
+    for (const std::size_t length : {8191U, 8192U, 8193U, 16'383U, 16'384U, 24'581U, 100'000U}) {
+        const auto part = std::span(bytes).first(length);
+        EXPECT_EQ(crc32c(part), crc32cByTable(part)) << length;
+        EXPECT_EQ(crc32c(part.subspan(3), crc32c(part.first(3))), crc32cByTable(part)) << length;
     }
 }
 
