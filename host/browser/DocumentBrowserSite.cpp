@@ -239,10 +239,10 @@ BrowserResponse DocumentBrowserSite::newAddress(const BrowserRequest& request,
     if (!found) {
         return responseOf(found.error());
     }
-    return jsonOf(
-        textJson("address", addresses_.addressOf({*view == "content" ? SignedPlace::View::content
-                                                                     : SignedPlace::View::download,
-                                                  (*found)->itemIdentifier, session})));
+    const SignedPlace place{
+        *view == "content" ? SignedPlace::View::content : SignedPlace::View::download,
+        (*found)->itemIdentifier, session};
+    return jsonOf(textJson("address", addresses_.addressOf(place, (*found)->filename)));
 }
 
 BrowserResponse DocumentBrowserSite::orderArchive(const BrowserRequest& request,
@@ -366,9 +366,10 @@ BrowserResponse DocumentBrowserSite::content(const std::string& item, SignedPlac
     if (shown) {
         response.fields.emplace_back("Content-Security-Policy", shownPolicy);
         response.fields.emplace_back("X-Frame-Options", "SAMEORIGIN");
-    } else {
-        response.fields.emplace_back("Content-Disposition", attachmentNamed((*found)->filename));
     }
+    response.fields.emplace_back("Content-Disposition", shown
+                                                            ? shownNamed((*found)->filename)
+                                                            : attachmentNamed((*found)->filename));
     const bool isSame = head.count("if-range") == 0 || head.field("if-range") == document->tag();
     const std::uint64_t size = document->size();
     const auto range = requestedRange(isSame ? head.field("range") : std::nullopt, size);
