@@ -77,6 +77,7 @@ export function fullDate(text) {
 }
 
 const ARCHIVES = /zip|tar|gzip|bzip|xz|zstd|7z|rar|compressed/;
+const PRESENTATIONS = /presentation|powerpoint/;
 const TABLES = /spreadsheet|excel|csv/;
 const CODE = /^text\/(x-|html|css|javascript|xml)|json|xml|javascript|shellscript|python/;
 
@@ -106,6 +107,9 @@ export function kindOf(item) {
   }
   if (TABLES.test(type)) {
     return { icon: "table", name: t("kindTable") };
+  }
+  if (PRESENTATIONS.test(type)) {
+    return { icon: "screens", name: t("kindPresentation") };
   }
   if (ARCHIVES.test(type)) {
     return { icon: "archive", name: t("kindArchive") };
