@@ -7,7 +7,7 @@ import { chooseFolder } from "./chooser.js";
 import { Details } from "./details.js";
 import { buttons, dialog, explain, menu, menuBelow, messages, tell, tellError } from "./dialogs.js";
 import { button, h, icon } from "./dom.js";
-import { fullDate, shownCount, shownName } from "./format.js";
+import { fullDate, shownClient, shownCount, shownName } from "./format.js";
 import { Listing, Place } from "./listing.js";
 import { listen } from "./live.js";
 import { isPreviewed, preview } from "./preview.js";
@@ -315,7 +315,8 @@ class Page {
         each.title = each === this.folderButton ? t("newFolder") : t("upload");
       }
     }
-    this.refusal.hidden = !isTop;
+    // Where there is nothing at all, what is shown in its place says what to do.
+    this.refusal.hidden = !isTop || this.listing.state === "ready" && this.listing.items.length === 0;
     this.refusal.replaceChildren(icon("info"), h("span", {}, t("refusedTop")));
   }
 
@@ -365,6 +366,7 @@ class Page {
     this.view.element.hidden = listing.state === "gone" || listing.state === "error";
     const content = this.stateContent();
     this.state.hidden = content === null;
+    this.showRefusal();
     this.state.replaceChildren(...(content ?? []));
     this.main.setAttribute("aria-busy", listing.state === "loading");
     this.showStatus();
@@ -689,7 +691,7 @@ class Page {
     const { sessions } = await get("/v1/sessions");
     await dialog(t("sessionsTitle"), (close) => [h("ul", { class: "sessions" },
       sessions.map(({ number, client, begun, isThis }) => h("li", {},
-        h("div", {}, h("span", {}, shownName(client)),
+        h("div", {}, h("span", { title: shownName(client) }, shownClient(client)),
           h("span", { class: "hint" }, t("since", { date: fullDate(begun) }) +
             (isThis ? ` · ${t("thisSession")}` : ""))),
         button(t("endSession"), null, async () => {

@@ -81,7 +81,7 @@ const ENGLISH = {
 const GERMAN = {
   documents: "Dokumente", applications: "Programme", favorites: "Favoriten", tags: "Schlagwörter",
   recents: "Zuletzt benutzt", trash: "Papierkorb", places: "Orte",
-  search: "Namen und Schlagwörter suchen", searchResults: "Ergebnisse für „{words}“",
+  search: "Name oder Schlagwort", searchResults: "Ergebnisse für „{words}“",
   taggedWith: "Schlagwort „{tag}“", name: "Name", modified: "Geändert", size: "Größe", kind: "Art",
   sortBy: "Sortieren nach", asList: "Als Liste zeigen", asGrid: "Als Raster zeigen",
   newFolder: "Neuer Ordner", upload: "Hochladen", uploadFiles: "Dateien hochladen…",

@@ -186,7 +186,9 @@ test("Live.anEndedSessionEndsAtOnce", async (stage) => {
   const page = await stage.person();
   await page.getByRole("button", { name: "More" }).click();
   await page.getByRole("menuitem", { name: "Sessions…" }).click();
-  await page.getByRole("dialog", { name: "Sessions" }).getByRole("button", { name: "End" }).click();
+  const sessions = page.getByRole("dialog", { name: "Sessions" });
+  await sessions.getByText(/^Chrome \d+, Linux$/).waitFor();
+  await sessions.getByRole("button", { name: "End" }).click();
   await page.waitForSelector("text=Open a new address");
 });
 
