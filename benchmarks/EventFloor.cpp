@@ -13,8 +13,8 @@
 
 #include "platform/linux/events/FanotifyMasks.h"
 #include "platform/linux/events/FanotifyRecords.h"
-#include "platform/linux/files/FileHandle.h"
 #include "platform/linux/files/CRC32C.h"
+#include "platform/linux/files/FileHandle.h"
 
 namespace marrowdale::benchmarks {
 namespace {

@@ -78,7 +78,7 @@ function(marrowdale_test name)
   # What is tested is optimised, for the tests' speed; the tests themselves, for the build's, are not.
   target_compile_options(${name} PRIVATE -O0)
   if(MARROWDALE_PRECOMPILE)
-    target_precompile_headers(${name} PRIVATE "${CMAKE_SOURCE_DIR}/cmake/TestHeaders.h")
+    target_precompile_headers(${name} PRIVATE "${CMAKE_SOURCE_DIR}/tests/support/TestHeaders.h")
   endif()
   # Listed when ctest starts: which file systems a test runs on is known only then.
   gtest_discover_tests(${name} TEST_PREFIX "${name}." DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60

@@ -1,7 +1,7 @@
 // What can be done to items: each asks where it must, does it, tells what was done, and offers to
 // undo it where that can be.
 
-import { act, addressOf, CAN, get, item as itemOf, itemPath, ROOT } from "./api.js";
+import { act, addressOf, archiveOf, CAN, get, itemPath, ROOT } from "./api.js";
 import { chooseFolder } from "./chooser.js";
 import { button, h } from "./dom.js";
 import { buttons, confirm, dialog, explain, tell, tellError } from "./dialogs.js";
@@ -28,6 +28,10 @@ async function forEach(items, work) {
     tellError(failure);
   }
   return done;
+}
+
+export function needsArchive(items) {
+  return items.length > 1 || items[0].isFolder || items[0].documentSize === undefined;
 }
 
 export function allow(items, capability) {
@@ -60,17 +64,20 @@ export class Actions {
     }
   }
 
-  async download(items) {
-    for (const item of items.filter((each) => !each.isFolder)) {
-      try {
-        const address = await addressOf(item.itemIdentifier, "download");
-        const link = h("a", { href: address, download: "" });
-        document.body.append(link);
-        link.click();
-        link.remove();
-      } catch (error) {
-        tellError(error);
-      }
+  // One file as it is; folders, packages and several items as an archive, named after the one or
+  // after the place that they are in.
+  async download(items, placeName) {
+    try {
+      const name = (items.length === 1 ? items[0].filename : placeName) + ".zip";
+      const address = needsArchive(items)
+        ? await archiveOf(items.map((item) => item.itemIdentifier), name)
+        : await addressOf(items[0].itemIdentifier, "download");
+      const link = h("a", { href: address, download: "" });
+      document.body.append(link);
+      link.click();
+      link.remove();
+    } catch (error) {
+      tellError(error);
     }
   }
 
@@ -261,9 +268,5 @@ export class Actions {
   async placeOfOrigin(item) {
     return (await get(itemPath(item.itemIdentifier, "/put-back"))).folder;
   }
-}
-
-export async function nameOfFolder(identifier) {
-  return identifier === ROOT ? t("documents") : shownName((await itemOf(identifier)).filename);
 }
 

@@ -33,6 +33,13 @@ export function whenSessionEnds(callback) {
   onEnded = callback;
 }
 
+// That session is good no more, which matters where it is still this window's.
+export function sessionEnded(token) {
+  if (token === session) {
+    onEnded();
+  }
+}
+
 // Takes up the session of this web browser, or begins one with the launch token that the printed
 // address carries. False when there is none.
 export async function begin() {
@@ -51,9 +58,38 @@ export async function begin() {
   return session !== null && isGood();
 }
 
+// Takes up the session that another window of this web browser has begun.
+export async function takeUp() {
+  const other = localStorage.getItem(STORED);
+  if (other === null || other === session) {
+    return false;
+  }
+  session = other;
+  return isGood();
+}
+
+// Calls back whenever another window begins a session.
+export function whenSessionBegins(callback) {
+  addEventListener("storage", ({ key }) => {
+    if (key === STORED) {
+      callback();
+    }
+  });
+}
+
 async function isGood() {
   const answer = await fetch("/v1/service", { headers: headers() });
   return answer.status !== 401;
+}
+
+// Whether the service itself answers, however long the documents take.
+export async function isAnswering(milliseconds) {
+  try {
+    return (await fetch("/v1/service", { headers: headers(),
+                                         signal: AbortSignal.timeout(milliseconds) })).ok;
+  } catch {
+    return false;
+  }
 }
 
 export function headers(more = {}) {
@@ -61,6 +97,7 @@ export function headers(more = {}) {
 }
 
 async function send(path, options = {}) {
+  const token = session;
   let answer;
   try {
     answer = await fetch(path, { ...options, headers: headers(options.headers) });
@@ -71,7 +108,7 @@ async function send(path, options = {}) {
     throw new ConnectionError(t("errorConnection"));
   }
   if (answer.status === 401) {
-    onEnded();
+    sessionEnded(token);
   }
   return answer;
 }
@@ -124,9 +161,31 @@ export async function beginning(identifier, length, signal) {
   return new Uint8Array(await answer.arrayBuffer());
 }
 
+// A document, or its small picture, as a whole; empty where there is none.
+export async function bytesOf(identifier, view) {
+  const answer = await send(itemPath(identifier, view));
+  if (!answer.ok) {
+    throw await failureOf(answer);
+  }
+  return new Uint8Array(await answer.arrayBuffer());
+}
+
 // An address that an image, a frame or a download can be given.
 export async function addressOf(identifier, view) {
   return (await post("/v1/addresses", { item: identifier, view })).address;
+}
+
+export async function archiveOf(identifiers, name) {
+  return (await post("/v1/archives", { items: identifiers, name })).address;
+}
+
+// The folders that lead to an item, the outermost first, with itself at the end.
+export async function trailOf(folder) {
+  const trail = [folder];
+  while (trail[0].itemIdentifier !== ROOT && !trail[0].isContainer && trail.length < 100) {
+    trail.unshift(await item(trail[0].parentItemIdentifier));
+  }
+  return trail;
 }
 
 // Events of a stream, one after the other: {event, data}.

@@ -1,13 +1,14 @@
 // Everything about what is selected.
 
-import { h, icon } from "./dom.js";
+import { h } from "./dom.js";
 import { fullDate, kindOf, shownName, shownSize } from "./format.js";
+import { pictureOf } from "./pictures.js";
+import { shownPlace } from "./places.js";
 import { t } from "./text.js";
 
 export class Details {
   constructor(actions) {
     this.actions = actions;
-    this.rootPath = "";  // of the documents, once it is known
     this.body = h("div", {});
     this.element = h("aside", { class: "details", "aria-label": t("details") }, this.body);
     this.element.hidden = localStorage.getItem("details") !== "shown";
@@ -42,25 +43,19 @@ export class Details {
     fact(t("lastUsed"), fullDate(item.lastUsedDate));
     fact(t("tags"), (item.tags ?? []).map(shownName).join(", "));
     fact(t("type"), item.isFolder ? "" : item.typeIdentifier);
-    fact(t("where"), this.shownPath(item));
+    fact(t("where"), item.isTrashed ? "" : shownPlace(item.path));
     fact(t("identifier"), item.itemIdentifier);
-    this.body.replaceChildren(h("div", { class: "details-icon" }, icon(kind.icon)),
+    this.body.replaceChildren(h("div", { class: "details-icon" }, pictureOf(item, 232, 160)),
       h("h2", {}, h("bdi", {}, shownName(item.filename))), facts);
     if (item.isTrashed) {
       this.showOrigin(item, facts);
     }
   }
 
-  // From the documents on; in full for what lies elsewhere.
-  shownPath({ path = "" }) {
-    const isWithin = this.rootPath !== "" && (path + "/").startsWith(this.rootPath + "/");
-    return shownName(isWithin ? path.slice(this.rootPath.lastIndexOf("/") + 1) : path);
-  }
-
   async showOrigin(item, facts) {
     const folder = await this.actions.placeOfOrigin(item).catch(() => null);
     if (folder && facts.isConnected) {
-      facts.prepend(h("dt", {}, t("original")), h("dd", {}, h("bdi", {}, this.shownPath(folder))));
+      facts.prepend(h("dt", {}, t("original")), h("dd", {}, h("bdi", {}, shownPlace(folder.path))));
     }
   }
 }

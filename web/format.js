@@ -76,7 +76,24 @@ export function fullDate(text) {
   return text ? full.format(new Date(text)) : "";
 }
 
+const BROWSERS = [["Edg", "Edge"], ["OPR", "Opera"], ["Firefox", "Firefox"], ["Chrome", "Chrome"],
+                  ["HeadlessChrome", "Chrome"], ["Version", "Safari"]];
+const SYSTEMS = [["Android", "Android"], ["Windows", "Windows"], ["Mac OS X", "macOS"], ["Linux", "Linux"]];
+
+// "Firefox 140, Linux", from what a web browser calls itself.
+export function shownClient(client) {
+  for (const [mark, name] of BROWSERS) {
+    const version = new RegExp(`\\b${mark}/(\\d+)`).exec(client)?.[1];
+    if (version) {
+      const system = SYSTEMS.find(([words]) => client.includes(words))?.[1];
+      return `${name} ${version}${system ? `, ${system}` : ""}`;
+    }
+  }
+  return shownName(client);
+}
+
 const ARCHIVES = /zip|tar|gzip|bzip|xz|zstd|7z|rar|compressed/;
+const PRESENTATIONS = /presentation|powerpoint/;
 const TABLES = /spreadsheet|excel|csv/;
 const CODE = /^text\/(x-|html|css|javascript|xml)|json|xml|javascript|shellscript|python/;
 
@@ -106,6 +123,9 @@ export function kindOf(item) {
   }
   if (TABLES.test(type)) {
     return { icon: "table", name: t("kindTable") };
+  }
+  if (PRESENTATIONS.test(type)) {
+    return { icon: "screens", name: t("kindPresentation") };
   }
   if (ARCHIVES.test(type)) {
     return { icon: "archive", name: t("kindArchive") };

@@ -100,14 +100,23 @@ export class Listing extends EventTarget {
   }
 
   changed(detail = {}) {
-    this.items = this.filter === "" ? this.all
-      : this.all.filter((item) => item.sortName.includes(this.filter));
+    this.items = this.filter === "" ? this.all : this.all.filter((item) => this.fits(item));
     this.dispatchEvent(new CustomEvent("change", { detail }));
   }
 
   setFilter(text) {
-    this.filter = naturalKey(text);
+    this.filter = naturalKey(text.trim());
     this.changed();
+  }
+
+  fits(item) {
+    return item.sortName.includes(this.filter);
+  }
+
+  // Whether an item of that identifier is among those that are shown.
+  has(identifier) {
+    const item = this.byID.get(identifier);
+    return item !== undefined && (this.filter === "" || this.fits(item));
   }
 
   setOrder(order) {

@@ -1,12 +1,13 @@
 // The page: where one is, what is shown there, and what can be done.
 
-import { Actions, allow } from "./actions.js";
-import { act, begin, CAN, get, item as itemOf, post, remove, ROOT, whenSessionEnds } from "./api.js";
+import { Actions, allow, needsArchive } from "./actions.js";
+import { act, begin, CAN, get, isAnswering, item as itemOf, post, remove, ROOT, takeUp, trailOf,
+         whenSessionBegins, whenSessionEnds } from "./api.js";
 import { chooseFolder } from "./chooser.js";
 import { Details } from "./details.js";
 import { buttons, dialog, explain, menu, menuBelow, messages, tell, tellError } from "./dialogs.js";
 import { button, h, icon } from "./dom.js";
-import { fullDate, shownCount, shownName } from "./format.js";
+import { fullDate, shownClient, shownCount, shownName } from "./format.js";
 import { Listing, Place } from "./listing.js";
 import { listen } from "./live.js";
 import { isPreviewed, preview } from "./preview.js";
@@ -69,8 +70,16 @@ class Page {
     this.state = h("div", { class: "state", hidden: true });
     this.banner = h("div", { class: "banner", role: "alert", hidden: true });
     this.refusal = h("p", { class: "refusal", hidden: true, id: "refusal" });
+    this.filter = h("input", { type: "text", class: "filter-field", placeholder: t("filterHint"),
+                               "aria-label": t("filterHere"), spellcheck: "false",
+                               oninput: () => this.filterTyped(),
+                               onkeydown: (event) => this.filterKey(event) });
+    this.filterBar = h("div", { class: "filter", hidden: true }, icon("filter"), this.filter,
+      button(t("close"), "close", () => this.closeFilter(), { kind: "quiet" }));
+    this.filterButton = button(t("filterHere"), "filter", () => this.toggleFilter(),
+                               { "aria-expanded": "false" });
     const toolbar = h("div", { class: "toolbar", role: "toolbar", "aria-label": t("actions") },
-      this.folderButton, this.uploadButton, this.modeButton,
+      this.folderButton, this.uploadButton, this.filterButton, this.modeButton,
       button(t("details"), "info", () => { this.details.toggle(); this.selectionChanged(); }),
       button(t("more"), "more", (event) => this.moreMenu(event.currentTarget),
              { "aria-haspopup": "menu" }));
@@ -85,7 +94,7 @@ class Page {
                              ondragover: (event) => this.draggedOver(event),
                              ondragleave: () => main.classList.remove("drop"),
                              ondrop: (event) => this.droppedHere(event) },
-      this.heading, this.refusal, this.view.element, this.state);
+      this.heading, this.refusal, this.filterBar, this.view.element, this.state);
     this.main = main;
     this.showMode();
     root.replaceChildren(this.sidebar.element,
@@ -99,8 +108,21 @@ class Page {
   start() {
     this.go();
     this.refreshSidebar();
-    itemOf(ROOT).then(({ path }) => { this.details.rootPath = path; }, tellError);
     listen((message) => this.heard(message));
+  }
+
+  // Before it is taken out of the window, which forgets how far a list was scrolled.
+  pause() {
+    this.scrolled = this.view.element.scrollTop;
+  }
+
+  // With another session, where one was.
+  goOn() {
+    this.view.element.scrollTop = this.scrolled;
+    this.showPlace();
+    listen((message) => this.heard(message));
+    this.heard({ state: "connected" });
+    this.refresh();
   }
 
   // -- Where one is
@@ -108,12 +130,19 @@ class Page {
   async go() {
     const { place, identifier } = placeInAddress();
     this.sidebar.element.classList.remove("open");
-    if (place) {
-      this.show(place);
+    const known = this.listing?.byID.get(identifier);
+    if (place || known?.isFolder && !known.isTrashed) {
+      this.show(place ?? new Place("folder", identifier));
       return;
     }
+    const { hash } = location;
+    const asked = new Listing(new Place("folder", identifier));
+    this.use(asked);
     try {
-      const item = await itemOf(identifier);
+      const item = await this.waitingFor(asked, itemOf(identifier));
+      if (location.hash !== hash) {
+        return;  // somebody has gone on
+      }
       if (item.isFolder && !item.isTrashed) {
         this.show(new Place("folder", item.itemIdentifier));
       } else {
@@ -122,9 +151,8 @@ class Page {
         this.view.choose(item.itemIdentifier);
       }
     } catch (error) {
-      const missing = new Listing(new Place("folder", identifier));
-      missing.fail(error);
-      this.use(missing);
+      asked.fail(error);
+      this.showState();
     }
   }
 
@@ -134,13 +162,7 @@ class Page {
     }
     const listing = new Listing(place);
     this.use(listing);
-    const slow = setTimeout(() => {
-      this.isSlow = true;
-      this.showState();
-    }, SLOW);
-    return listing.load().finally(() => {
-      clearTimeout(slow);
-      this.isSlow = false;
+    return this.waitingFor(listing, listing.load()).finally(() => {
       if (this.listing === listing) {
         this.showPlace();
         this.showState();
@@ -149,11 +171,37 @@ class Page {
     });
   }
 
+  // Says why when an answer takes long: the service answers at once, but for the documents
+  // themselves while it compares what it knows of them with the disk.
+  async waitingFor(listing, answer) {
+    const slow = setTimeout(async () => {
+      const isThere = await isAnswering(SLOW);
+      if (this.listing === listing && isWaiting) {
+        this.slowness = isThere ? "checking" : "unanswered";
+        this.showState();
+      }
+    }, SLOW);
+    let isWaiting = true;
+    try {
+      return await answer;
+    } finally {
+      isWaiting = false;
+      clearTimeout(slow);
+      if (this.listing === listing && this.slowness) {
+        this.slowness = null;
+        this.showState();
+      }
+    }
+  }
+
   use(listing) {
-    const hadFocus = this.view.element.contains(document.activeElement) ||
-      document.activeElement === document.body;
+    this.slowness = null;
+    // Not when the page opens: nobody has moved yet, and a frame around the first item looks odd.
+    const hadFocus = this.listing !== null &&
+      (this.view.element.contains(document.activeElement) || document.activeElement === document.body);
     this.listing?.close();
     this.listing = listing;
+    this.closeFilter();
     this.wantsFocus = hadFocus;
     listing.addEventListener("change", (event) => {
       this.showState();
@@ -211,17 +259,12 @@ class Page {
       this.crumbs.replaceChildren(h("ol", {}, crumb(this.title || t("loading"), "", true)));
       return;
     }
-    const path = [];
-    let at = this.folder;
+    let path;
     try {
-      while (at.itemIdentifier !== ROOT && !at.isContainer && path.length < 100) {
-        path.unshift(at);
-        at = await itemOf(at.parentItemIdentifier);
-      }
+      path = await trailOf(this.folder);
     } catch {
       return;  // gone meanwhile, which the listing tells
     }
-    path.unshift(at);
     if (this.listing === listing) {
       this.crumbs.replaceChildren(h("ol", {}, path.map((item, index) => crumb(
         item.itemIdentifier === ROOT ? t("documents") : shownName(item.filename),
@@ -272,7 +315,8 @@ class Page {
         each.title = each === this.folderButton ? t("newFolder") : t("upload");
       }
     }
-    this.refusal.hidden = !isTop;
+    // Where there is nothing at all, what is shown in its place says what to do.
+    this.refusal.hidden = !isTop || this.listing.state === "ready" && this.listing.items.length === 0;
     this.refusal.replaceChildren(icon("info"), h("span", {}, t("refusedTop")));
   }
 
@@ -322,6 +366,7 @@ class Page {
     this.view.element.hidden = listing.state === "gone" || listing.state === "error";
     const content = this.stateContent();
     this.state.hidden = content === null;
+    this.showRefusal();
     this.state.replaceChildren(...(content ?? []));
     this.main.setAttribute("aria-busy", listing.state === "loading");
     this.showStatus();
@@ -343,8 +388,12 @@ class Page {
     if (listing.items.length > 0) {
       return null;
     }
+    if (listing.filter !== "" && listing.all.length > 0) {
+      return told("filter", t("emptyFilter"), "",
+                  button(t("showAll"), null, () => this.closeFilter(), { text: true }));
+    }
     if (listing.state === "loading") {
-      return this.isSlow ? told("clock", t("checking"), t("checkingHint"))
+      return this.slowness ? told("clock", t(this.slowness), t(`${this.slowness}Hint`))
         : [h("p", { class: "hint" }, t("loading"))];
     }
     return this.emptyContent(told);
@@ -372,14 +421,18 @@ class Page {
     this.listing.close();
     this.listing = null;
     this.show(place);
+    this.view.element.focus();
   }
 
   showStatus() {
     const { listing } = this;
     const total = listing.items.length;
     const selected = this.view.selected.size;
-    const counted = total === 1 ? t("oneItem") : t("itemCount", { n: shownCount(total) });
-    this.status.textContent = listing.state === "loading"
+    const counted = listing.filter !== ""
+      ? t("filteredCount", { n: shownCount(total), total: shownCount(listing.all.length) })
+      : total === 1 ? t("oneItem") : t("itemCount", { n: shownCount(total) });
+    this.status.textContent = this.slowness && total > 0 ? t(this.slowness)
+      : listing.state === "loading"
       ? (total > 0 ? t("loadedSoFar", { n: shownCount(total) }) : t("loading"))
       : selected > 0 ? t("selectedCount", { n: shownCount(selected), total: shownCount(total) })
       : counted;
@@ -414,9 +467,7 @@ class Page {
   // -- News
 
   heard({ state, signal }) {
-    if (state === "ended") {
-      showEnded();
-    } else if (state === "lost") {
+    if (state === "lost") {
       this.wasLost = true;
       this.banner.hidden = false;
       this.banner.replaceChildren(icon("alert"), h("span", {}, t("lost")));
@@ -432,7 +483,7 @@ class Page {
 
   refresh() {
     this.refreshSidebarSoon();
-    return this.listing?.refresh();
+    return this.listing && this.waitingFor(this.listing, this.listing.refresh());
   }
 
   refreshSidebarSoon() {
@@ -446,6 +497,49 @@ class Page {
     this.sidebar.refresh().catch(() => {
       // Whatever it is, the content or the banner tells it.
     });
+  }
+
+  // -- Filter
+
+  toggleFilter() {
+    if (this.filterBar.hidden) {
+      this.openFilter();
+    } else {
+      this.closeFilter();
+    }
+  }
+
+  openFilter() {
+    this.filterBar.hidden = false;
+    this.filterButton.setAttribute("aria-expanded", "true");
+    this.filter.focus();
+  }
+
+  closeFilter() {
+    const hadFocus = this.filterBar.contains(document.activeElement);
+    this.filterBar.hidden = true;
+    this.filterButton.setAttribute("aria-expanded", "false");
+    this.filter.value = "";
+    if (this.listing?.filter) {
+      this.listing.setFilter("");
+    }
+    if (hadFocus) {
+      this.view.element.focus();
+    }
+  }
+
+  filterTyped() {
+    this.listing.setFilter(this.filter.value);
+  }
+
+  filterKey(event) {
+    if (event.key === "Escape") {
+      this.closeFilter();
+      event.preventDefault();
+    } else if (event.key === "ArrowDown" || event.key === "Enter") {
+      this.view.element.focus();
+      event.preventDefault();
+    }
   }
 
   // -- Search
@@ -530,9 +624,9 @@ class Page {
     return [
       { label: t("newFolder"), icon: "newFolder", reason, act: () => this.newFolder() },
       { label: t("uploadFiles"), icon: "upload", reason, act: () => this.files.click() },
-      { label: t("uploadFolder"), reason, act: () => this.directories.click() },
+      { label: t("uploadFolder"), icon: "newFolder", reason, act: () => this.directories.click() },
       null,
-      { label: t("selectAll"), keys: t("keyAll"), act: () => this.view.selectAll() },
+      { label: t("selectAll"), icon: "check", keys: t("keyAll"), act: () => this.view.selectAll() },
       isTrash ? { label: t("emptyTrash"), icon: "trash", act: () => this.actions.emptyTrash() }
         : undefined].filter((entry) => entry !== undefined);
   }
@@ -546,17 +640,17 @@ class Page {
       isOne ? { label: t("open"), icon: "chevron", keys: "Enter", act: () => this.open(item) } : undefined,
       isOne && isPreviewed(item) ? { label: t("preview"), icon: "image", keys: t("keySpace"),
                                      act: () => this.preview(item) } : undefined,
-      items.some((each) => !each.isFolder)
-        ? { label: t("download"), icon: "download", act: () => this.actions.download(items) } : undefined,
+      { label: t(needsArchive(items) ? "downloadArchive" : "download"), icon: "download",
+        act: () => this.actions.download(items, this.title) },
       null,
-      isOne ? { label: t("rename"), keys: "F2", reason: unless(CAN.rename),
+      isOne ? { label: t("rename"), icon: "pencil", keys: "F2", reason: unless(CAN.rename),
                 act: () => this.view.beginRename(item) } : undefined,
       { label: t("moveTo"), icon: "folder", reason: unless(CAN.move),
         act: () => this.actions.chooseAndMove(items) },
       { label: t("editTags"), icon: "tag", act: () => this.actions.editTags(items) },
       { label: t(isFavorite ? "removeFavorite" : "addFavorite"), icon: "star",
         act: () => this.actions.setFavorite(items, !isFavorite) },
-      isOne ? { label: t("copyAddress"), act: () => this.actions.copyAddress(item) } : undefined,
+      isOne ? { label: t("copyAddress"), icon: "link", act: () => this.actions.copyAddress(item) } : undefined,
       null,
       { label: t("moveToTrash"), icon: "trash", keys: t("keyDelete"), reason: unless(CAN.trash),
         act: () => this.actions.trash(items) }];
@@ -568,7 +662,7 @@ class Page {
       { label: t("putBack"), icon: "undo", act: () => this.actions.putBack(items) },
       { label: t("moveTo"), icon: "folder", act: () => this.actions.chooseAndMove(items) },
       null,
-      { label: t("deleteForGood"), keys: t("keyDelete"), act: () => this.actions.deleteForGood(items) },
+      { label: t("deleteForGood"), icon: "close", keys: t("keyDelete"), act: () => this.actions.deleteForGood(items) },
       { label: t("emptyTrash"), icon: "trash", act: () => this.actions.emptyTrash() }];
   }
 
@@ -579,7 +673,7 @@ class Page {
       act: () => { this.view.sortBy(key); this.view.element.focus(); } }));
     menuBelow(element, [...this.entries(), null, ...sorts, null,
       { label: t("newWindow"), icon: "screens", act: () => this.otherBrowser() },
-      { label: t("sessions"), act: () => this.showSessions() }]);
+      { label: t("sessions"), icon: "menu", act: () => this.showSessions() }]);
   }
 
   async otherBrowser() {
@@ -597,7 +691,7 @@ class Page {
     const { sessions } = await get("/v1/sessions");
     await dialog(t("sessionsTitle"), (close) => [h("ul", { class: "sessions" },
       sessions.map(({ number, client, begun, isThis }) => h("li", {},
-        h("div", {}, h("span", {}, shownName(client)),
+        h("div", {}, h("span", { title: shownName(client) }, shownClient(client)),
           h("span", { class: "hint" }, t("since", { date: fullDate(begun) }) +
             (isThis ? ` · ${t("thisSession")}` : ""))),
         button(t("endSession"), null, async () => {
@@ -719,6 +813,7 @@ class Page {
     const done = {
       "/": () => this.search.focus(),
       "Ctrl+f": () => this.search.focus(),
+      "Ctrl+i": () => this.openFilter(),
       "Ctrl+a": () => this.view.selectAll(),
       "Ctrl+z": () => this.actions.undo?.(),
       "Ctrl+Shift+N": () => this.newFolder(),
@@ -735,6 +830,9 @@ class Page {
     if (done) {
       event.preventDefault();
       done();
+    } else if (event.target === document.body && /^(Arrow|Page|Home|End)/.test(event.key)) {
+      event.preventDefault();
+      this.view.element.focus();
     }
   }
 
@@ -758,20 +856,57 @@ class Page {
   }
 }
 
-function showEnded() {
-  document.getElementById("app").replaceChildren(h("main", { class: "ended" },
-    h("img", { src: "/assets/icon.svg", alt: "", width: "56", height: "56" }),
-    h("h1", {}, t("endedTitle")), h("p", {}, t("endedHint"))));
-  document.title = "Marrowdale";
-}
+// Without a session the page waits, as it is, for another window of this web browser to begin one.
+class Window {
+  constructor(root) {
+    this.root = root;
+    this.page = null;
+    this.hidden = null;  // what the page shows, while it waits
+    whenSessionEnds(() => this.end());
+    whenSessionBegins(() => this.goOn());
+  }
 
-async function start() {
-  whenSessionEnds(showEnded);
-  if (await begin()) {
-    new Page(document.getElementById("app")).start();
-  } else {
-    showEnded();
+  async start() {
+    if (await begin()) {
+      this.showPage();
+    } else {
+      this.end();
+    }
+  }
+
+  showPage() {
+    this.page = new Page(this.root);
+    this.page.start();
+  }
+
+  end() {
+    if (this.hidden) {
+      return;
+    }
+    document.querySelectorAll("dialog").forEach((dialog) => dialog.close());
+    this.page?.pause();
+    this.hidden = [...this.root.childNodes];
+    this.root.replaceChildren(h("main", { class: "ended" },
+      h("img", { src: "/assets/icon.svg", alt: "", width: "56", height: "56" }),
+      h("h1", {}, t("endedTitle")), h("p", {}, t("endedHint")),
+      h("code", {}, "marrowdale browse"), h("p", {}, t("endedMore"))));
+    document.title = "Marrowdale";
+    this.goOn();  // where another window was quicker
+  }
+
+  async goOn() {
+    if (!this.hidden || !await takeUp()) {
+      return;
+    }
+    const shown = this.hidden;
+    this.hidden = null;
+    if (this.page) {
+      this.root.replaceChildren(...shown);
+      this.page.goOn();
+    } else {
+      this.showPage();
+    }
   }
 }
 
-start();
+new Window(document.getElementById("app")).start();

@@ -31,7 +31,7 @@ async function content(item, signal) {
   }
   if (type === "application/pdf") {
     return h("iframe", { class: "preview-frame", title: name,
-                         src: await addressOf(item.itemIdentifier, "content") });
+                         src: await addressOf(item.itemIdentifier, "content") + "#navpanes=0" });
   }
   if (TEXT.test(type)) {
     return text(item, signal);
@@ -81,8 +81,8 @@ export function preview(items, index, { moved, open, download }) {
       }
     } },
     h("div", { class: "dialog-head" }, h("h2", { id: "preview-title" }, title), facts,
-      button(t("previous"), "up", () => go(-1), { kind: "quiet" }),
-      button(t("next"), "down", () => go(1), { kind: "quiet" }),
+      button(t("previous"), "left", () => go(-1), { kind: "quiet" }),
+      button(t("next"), "chevron", () => go(1), { kind: "quiet" }),
       button(t("download"), "download", () => download(items[at]), { kind: "quiet" }),
       button(t("close"), "close", () => element.close(), { kind: "quiet" })),
     place);

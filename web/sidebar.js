@@ -3,6 +3,8 @@
 import { get, itemPath, ROOT } from "./api.js";
 import { h, icon } from "./dom.js";
 import { shownCount, shownName, shownSize } from "./format.js";
+import { pictureOf } from "./pictures.js";
+import { knowPlaces } from "./places.js";
 import { t } from "./text.js";
 
 export class Sidebar {
@@ -51,7 +53,7 @@ export class Sidebar {
     this.mark();
   }
 
-  line({ place, address, icon: picture }) {
+  line({ place, address, icon: name, item }) {
     const link = h("a", { href: address, class: "place",
                           ondragover: (event) => {
                             if (this.delegate.isDropTargetPlace(place)) {
@@ -65,7 +67,7 @@ export class Sidebar {
                             link.classList.remove("drop");
                             this.delegate.droppedOnPlace(place, event);
                           } },
-      icon(picture), h("bdi", { class: "place-name" }), h("span", { class: "count" }));
+      item ? pictureOf(item, 18, 18) : icon(name), h("bdi", { class: "place-name" }), h("span", { class: "count" }));
     const line = h("li", {}, link);
     line.dataset.place = place;
     return line;
@@ -88,11 +90,13 @@ export class Sidebar {
   }
 
   async refresh() {
-    const [first, { tags }, space] = await Promise.all([
-      get(itemPath(ROOT, "/children")), get("/v1/tags"), get("/v1/space")]);
+    const [root, first, { tags }, space] = await Promise.all([
+      get(itemPath(ROOT)), get(itemPath(ROOT, "/children")), get("/v1/tags"), get("/v1/space")]);
     const applications = first.items.filter((item) => item.isContainer);
+    knowPlaces([{ path: root.path, name: t("documents") },
+                ...applications.map(({ path, filename }) => ({ path, name: filename }))]);
     this.fill(this.applications, applications.map((item) => ({
-      place: `folder/${item.itemIdentifier}`, icon: "app", name: item.filename,
+      place: `folder/${item.itemIdentifier}`, item, name: item.filename,
       address: `#/item/${encodeURIComponent(item.itemIdentifier)}` })));
     this.fill(this.tags, tags.map(({ tag, items }) => ({
       place: `tagged/${tag}`, icon: "tag", name: tag, count: shownCount(items),

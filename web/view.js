@@ -3,11 +3,14 @@
 
 import { h, icon } from "./dom.js";
 import { fullDate, kindOf, shownDate, shownName, shownSize } from "./format.js";
+import { pictureOf } from "./pictures.js";
+import { shownFolder } from "./places.js";
 import { t } from "./text.js";
 
 const ROW_HEIGHT = 38;
-const TILE_WIDTH = 136;
-const TILE_HEIGHT = 132;
+const TILE_WIDTH = 152;
+const TILE_HEIGHT = 172;
+const TILE_PICTURE = { width: 128, height: 88 };
 const BEYOND = 6;  // rows above and below that are made, too
 
 const COLUMNS = ["name", "modified", "size", "kind"];
@@ -107,7 +110,7 @@ export class View extends EventTarget {
     const top = this.topItem;
     const isAtStart = this.grid.scrollTop <= 0;
     for (const identifier of this.selected) {
-      if (!this.listing.byID.has(identifier)) {
+      if (!this.listing.has(identifier)) {
         this.selected.delete(identifier);
       }
     }
@@ -124,7 +127,7 @@ export class View extends EventTarget {
 
   // The neighbour of an item that is gone is current then.
   keepCurrent() {
-    if (this.current && !this.listing.byID.has(this.current)) {
+    if (this.current && !this.listing.has(this.current)) {
       const at = Math.min(this.currentIndex ?? 0, this.items.length - 1);
       this.current = this.items[at]?.itemIdentifier ?? null;
       this.pivot = this.current;
@@ -239,8 +242,9 @@ export class View extends EventTarget {
   makeRow(item) {
     const kind = kindOf(item);
     const cells = [
-      h("div", { class: "cell name", role: "gridcell", "aria-colindex": "1" }, icon(kind.icon),
-        this.nameOf(item), this.marksOf(item)),
+      h("div", { class: "cell name", role: "gridcell", "aria-colindex": "1" },
+        item.isContainer ? pictureOf(item, 18, 18) : icon(kind.icon),
+        this.nameOf(item), this.marksOf(item), this.folderOf(item)),
       h("div", { class: "cell modified", role: "gridcell", "aria-colindex": "2",
                  title: fullDate(item.contentModificationDate) },
         shownDate(item.contentModificationDate)),
@@ -254,7 +258,7 @@ export class View extends EventTarget {
     return h("div", { class: "tile-row", role: "row" }, items.map((item, index) =>
       this.prepared(h("div", { class: "tile", role: "gridcell", id: elementID(item),
                                "aria-colindex": index + 1 },
-        icon(kindOf(item).icon), this.nameOf(item),
+        pictureOf(item, TILE_PICTURE.width, TILE_PICTURE.height), this.nameOf(item),
         h("span", { class: "tile-more" }, item.isFolder ? kindOf(item).name
           : shownSize(item.documentSize)), this.marksOf(item)), item)));
   }
@@ -262,6 +266,13 @@ export class View extends EventTarget {
   nameOf(item) {
     const shown = shownName(item.filename);
     return h("bdi", { class: "item-name", title: shown }, shown);
+  }
+
+  // Beside a name, where what is listed comes from many folders.
+  folderOf(item) {
+    const { kind } = this.listing.place;
+    return kind === "folder" || kind === "trash" || item.isContainer ? null
+      : h("bdi", { class: "item-folder" }, shownFolder(item));
   }
 
   marksOf(item) {

@@ -1,12 +1,14 @@
 #include "host/browser/BrowserConnection.h"
 
 #include <algorithm>
+#include <array>
 #include <atomic>
 #include <boost/asio/co_spawn.hpp>
 #include <boost/asio/detached.hpp>
 #include <boost/asio/post.hpp>
 #include <boost/asio/write.hpp>
 #include <cerrno>
+#include <charconv>
 #include <sys/socket.h>
 
 #include "host/browser/HttpResponse.h"
@@ -44,6 +46,16 @@ std::string_view reasonOf(HeadFault fault) {
             break;
     }
     return "HTTP/1.1 is wanted";
+}
+
+// An empty one is the last.
+std::string chunkOf(std::string_view content) {
+    std::array<char, 2 * sizeof(std::size_t)> digits{};
+    constexpr int hexadecimal = 16;
+    const auto written =
+        std::to_chars(digits.data(), digits.data() + digits.size(), content.size(), hexadecimal);
+    std::string chunk(digits.data(), written.ptr);
+    return chunk.append("\r\n").append(content).append("\r\n");
 }
 
 // Paths have one form: what could be read as another one by somebody else is refused.
@@ -402,7 +414,7 @@ Awaitable<bool> BrowserConnection::write(std::string_view text) {
 
 Awaitable<bool> BrowserConnection::send(BrowserResponse& response) {
     const auto length = response.source ? response.length : response.body.size();
-    const bool goesOn = keepsAlive_ && length.has_value();
+    const bool goesOn = keepsAlive_;
     const std::string head = headOf(response, length, goesOn);
     if (!response.source) {
         const std::string whole = head + response.body;
@@ -422,15 +434,19 @@ Awaitable<bool> BrowserConnection::sendSource(ContentSource& source,
     for (std::uint64_t left = length.value_or(UINT64_MAX); left > 0;) {
         piece.resize(std::min<std::uint64_t>(left, pieceSize));
         const auto count = co_await on(threads_.content(), [&] { return source.read(piece); });
-        if (!count) {
+        // Where something is missing, the end of the connection tells.
+        if (!count || (*count == 0 && length)) {
+            co_return false;
+        }
+        piece.resize(*count);
+        if (!length) {
+            piece = chunkOf(piece);
+        }
+        if (!co_await write(piece)) {
             co_return false;
         }
         if (*count == 0) {
-            // Shorter than was said: the end of the connection tells.
-            co_return !length.has_value();
-        }
-        if (!co_await write(std::string_view(piece).substr(0, *count))) {
-            co_return false;
+            co_return true;
         }
         left -= *count;
     }

@@ -21,6 +21,7 @@ namespace {
 
 using namespace std::string_literals;
 using ::testing::HasSubstr;
+using ::testing::Not;
 using ::testing::StartsWith;
 
 constexpr std::chrono::seconds patience{30};
@@ -38,6 +39,21 @@ class Zeros final : public ContentSource {
 
   private:
     std::uint64_t left_;
+};
+
+// Content that can't be read to its end.
+class Broken final : public ContentSource {
+  public:
+    Expected<std::size_t> read(std::span<char> buffer) override {
+        if (std::exchange(hasBegun_, true)) {
+            return Unexpected(errorWithPOSIXCode(EIO));
+        }
+        buffer[0] = '0';
+        return std::size_t{1};
+    }
+
+  private:
+    bool hasBegun_ = false;
 };
 
 // Answers what the path says, and counts uploads that ended and that did not.
@@ -68,6 +84,10 @@ class TestSite final : public BrowserSite {
         if (what == "zeros" || what == "short") {
             response.length = 1'000'000;
             response.source = std::make_unique<Zeros>(what == "short" ? 1000 : 1'000'000);
+        } else if (what == "chunks") {
+            response.source = std::make_unique<Zeros>(100'000);
+        } else if (what == "broken") {
+            response.source = std::make_unique<Broken>();
         } else {
             response.body = what + "|" + request.request.body;
         }
@@ -316,6 +336,26 @@ TEST_F(BrowserServerTest, contentThatIsShorterThanWasSaidEndsTheConnection) {
     start();
     const std::string answer = answerTo(get("/short"));
     EXPECT_EQ(answer.substr(answer.find("\r\n\r\n") + 4), std::string(1000, '0'));
+}
+
+TEST_F(BrowserServerTest, contentOfAnUnknownLengthIsSentInChunksOnAConnectionThatGoesOn) {
+    start();
+    Client client(server_->port());
+    client.say(get("/chunks"));
+    const std::string answer = client.hear("\r\n0\r\n\r\n");
+    EXPECT_THAT(answer, HasSubstr("Transfer-Encoding: chunked\r\n"));
+    EXPECT_THAT(answer, Not(HasSubstr("Content-Length")));
+    const std::string wanted = "10000\r\n" + std::string(0x10000, '0') + "\r\n86a0\r\n" +
+                               std::string(100'000 - 0x10000, '0') + "\r\n0\r\n\r\n";
+    EXPECT_EQ(answer.substr(answer.find("\r\n\r\n") + 4), wanted);
+    client.say(get("/again"));
+    EXPECT_THAT(client.hear("again|"), StartsWith("HTTP/1.1 200 OK\r\n"));
+}
+
+TEST_F(BrowserServerTest, contentThatFailsHasNoLastChunk) {
+    start();
+    const std::string answer = answerTo(get("/broken"));
+    EXPECT_EQ(answer.substr(answer.find("\r\n\r\n") + 4), "1\r\n0\r\n");
 }
 
 TEST_F(BrowserServerTest, anUploadGoesToItsSinkPieceByPiece) {

@@ -15,7 +15,12 @@ Expected<std::unique_ptr<BrowserService>> BrowserService::start(HostService& ser
     }
     std::unique_ptr<BrowserService> browser(new BrowserService(service, std::move(*server)));
     browser->server_->serve(browser->site_);
+    browser->api_.offerBrowser([site = &browser->site_] { return site->newLaunchAddress(); });
     return browser;
+}
+
+BrowserService::~BrowserService() {
+    api_.offerBrowser(nullptr);
 }
 
 }  // namespace marrowdale::host

@@ -18,17 +18,22 @@ class BrowserService {
     static constexpr std::uint16_t usualPort = 8474;
 
     // At that port (0: any free one). Without one, at the usual port, or any free one where that is
-    // taken. The service outlives the object.
+    // taken. The service outlives the object and, until then, tells others its addresses.
     [[nodiscard]] static Expected<std::unique_ptr<BrowserService>> start(
         HostService& service, std::optional<std::uint16_t> port);
+
+    ~BrowserService();
+    BrowserService(const BrowserService&) = delete;
+    BrowserService& operator=(const BrowserService&) = delete;
 
     // For a person to open: begins a session, once.
     [[nodiscard]] std::string newAddress() { return site_.newLaunchAddress(); }
 
   private:
     BrowserService(HostService& service, std::unique_ptr<BrowserServer> server)
-        : site_(service, server->port()), server_(std::move(server)) {}
+        : api_(service.api()), site_(service, server->port()), server_(std::move(server)) {}
 
+    Api& api_;
     DocumentBrowserSite site_;
     std::unique_ptr<BrowserServer> server_;  // goes first
 };

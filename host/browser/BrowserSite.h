@@ -28,8 +28,8 @@ class ContentSource {
     [[nodiscard]] virtual Expected<std::size_t> read(std::span<char> buffer) = 0;
 };
 
-// An answer. Content is `body`, or comes from `source`, then of a known length or to the end of the
-// connection.
+// An answer. Content is `body`, or comes from `source`, then of a known length or in chunks, the
+// last of which says that nothing is missing.
 struct BrowserResponse {
     unsigned status = 200;
     std::vector<std::pair<std::string, std::string>> fields = {};

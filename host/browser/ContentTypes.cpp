@@ -49,6 +49,13 @@ std::string asciiName(std::string_view name) {
     return ascii;
 }
 
+std::string namedAs(std::string_view disposition, std::string_view name) {
+    std::string plain = plainName(name);
+    std::ranges::replace(plain, '/', '_');
+    return std::string(disposition) + "; filename=\"" + asciiName(plain) + "\"; filename*=UTF-8''" +
+           percentEncodedPath(plain);
+}
+
 }  // namespace
 
 std::optional<std::string> shownContentType(std::string_view typeIdentifier) {
@@ -60,10 +67,11 @@ std::optional<std::string> shownContentType(std::string_view typeIdentifier) {
 }
 
 std::string attachmentNamed(std::string_view name) {
-    std::string plain = plainName(name);
-    std::ranges::replace(plain, '/', '_');
-    return "attachment; filename=\"" + asciiName(plain) + "\"; filename*=UTF-8''" +
-           percentEncodedPath(plain);
+    return namedAs("attachment", name);
+}
+
+std::string shownNamed(std::string_view name) {
+    return namedAs("inline", name);
 }
 
 }  // namespace marrowdale::host

@@ -15,5 +15,7 @@ namespace marrowdale::host {
 // and marks that turn the direction of text are left out of the name; bytes that are no UTF-8
 // become U+FFFD.
 [[nodiscard]] std::string attachmentNamed(std::string_view name);
+// The same for one that is shown, and maybe kept from there.
+[[nodiscard]] std::string shownNamed(std::string_view name);
 
 }  // namespace marrowdale::host

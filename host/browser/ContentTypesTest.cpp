@@ -26,6 +26,7 @@ TEST(ContentTypesTest, namesAreOneFieldWhateverTheyHold) {
               "attachment; filename=\"a b.txt\"; filename*=UTF-8''a%20b.txt");
     EXPECT_THAT(attachmentNamed("\xC3\xA4"), HasSubstr("filename*=UTF-8''%C3%A4"));
     EXPECT_THAT(attachmentNamed("a\xFF"), HasSubstr("''a%EF%BF%BD"));
+    EXPECT_EQ(shownNamed("a.pdf"), "inline; filename=\"a.pdf\"; filename*=UTF-8''a.pdf");
     const std::string hostile = attachmentNamed("a\r\nX: \"y\"\\\xE2\x80\xAEgnp.exe");
     EXPECT_THAT(hostile, Not(HasSubstr("\r")));
     EXPECT_THAT(hostile, Not(HasSubstr("\n")));

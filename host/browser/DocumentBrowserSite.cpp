@@ -10,6 +10,7 @@
 #include "host/browser/DocumentFile.h"
 #include "host/browser/HttpResponse.h"
 #include "host/browser/StaticFiles.h"
+#include "host/browser/ZipArchive.h"
 #include "host/requests/FeedJson.h"
 #include "host/requests/ItemJson.h"
 #include "host/requests/JsonReading.h"
@@ -136,6 +137,10 @@ BrowserResponse DocumentBrowserSite::file(const BrowserRequest& request) {
                    ? content(place->item, place->view, request.head)
                    : refusalOf(forbidden, "the session of this address has ended");
     }
+    if (request.request.path.size() == 3 && request.request.path[0] == "files" &&
+        request.request.path[1] == "archive") {
+        return archive(request.request.path[2]);
+    }
     if (request.request.path.front() == "files") {
         return refusalOf(forbidden, "this address is not good, or not any more");
     }
@@ -178,6 +183,9 @@ std::optional<BrowserResponse> DocumentBrowserSite::ownAnswer(const BrowserReque
     }
     if (place == "POST addresses" && depth == 2) {
         return newAddress(request, session);
+    }
+    if (place == "POST archives" && depth == 2) {
+        return orderArchive(request, session);
     }
     if (place == "GET collections" && depth >= 3) {
         return collection(asked);
@@ -231,10 +239,49 @@ BrowserResponse DocumentBrowserSite::newAddress(const BrowserRequest& request,
     if (!found) {
         return responseOf(found.error());
     }
-    return jsonOf(
-        textJson("address", addresses_.addressOf({*view == "content" ? SignedPlace::View::content
-                                                                     : SignedPlace::View::download,
-                                                  (*found)->itemIdentifier, session})));
+    const SignedPlace place{
+        *view == "content" ? SignedPlace::View::content : SignedPlace::View::download,
+        (*found)->itemIdentifier, session};
+    return jsonOf(textJson("address", addresses_.addressOf(place, (*found)->filename)));
+}
+
+BrowserResponse DocumentBrowserSite::orderArchive(const BrowserRequest& request,
+                                                  std::uint64_t session) {
+    const auto body = parsedJson(request.request.body);
+    const auto* const items = body ? arrayMember(*body, "items") : nullptr;
+    const auto name = body ? textMember(*body, "name") : std::nullopt;
+    if (items == nullptr || items->empty() || items->size() > OrderedArchives::mostItems || !name) {
+        return refusalOf(badRequest, "a name and some items are wanted, ten thousand at most");
+    }
+    OrderedArchives::Order order{.session = session, .name = *name, .items = {}};
+    for (const auto& item : *items) {
+        auto identifier = bytes(item);
+        if (!identifier) {
+            return refusalOf(badRequest, "identifiers are texts");
+        }
+        order.items.push_back(std::move(*identifier));
+    }
+    return jsonOf(textJson("address", "/files/archive/" + archives_.add(std::move(order))));
+}
+
+// What is gone by now is left out, as what goes while the archive is made.
+BrowserResponse DocumentBrowserSite::archive(std::string_view secret) {
+    const auto order = archives_.find(secret);
+    if (!order || !sessions_.has(order->session)) {
+        return refusalOf(forbidden, "this address is not good, or not any more");
+    }
+    std::vector<FileProviderItemPtr> items;
+    for (const std::string& identifier : order->items) {
+        auto item = service_.requests().item(identifier);
+        if (item) {
+            items.push_back(std::move(*item));
+        }
+    }
+    BrowserResponse response;
+    response.fields = {{"Content-Type", "application/zip"},
+                       {"Content-Disposition", attachmentNamed(order->name)}};
+    response.source = std::make_unique<ZipArchive>(std::move(items));
+    return response;
 }
 
 BrowserResponse DocumentBrowserSite::collection(const ApiRequest& request) {
@@ -319,9 +366,10 @@ BrowserResponse DocumentBrowserSite::content(const std::string& item, SignedPlac
     if (shown) {
         response.fields.emplace_back("Content-Security-Policy", shownPolicy);
         response.fields.emplace_back("X-Frame-Options", "SAMEORIGIN");
-    } else {
-        response.fields.emplace_back("Content-Disposition", attachmentNamed((*found)->filename));
     }
+    response.fields.emplace_back("Content-Disposition", shown
+                                                            ? shownNamed((*found)->filename)
+                                                            : attachmentNamed((*found)->filename));
     const bool isSame = head.count("if-range") == 0 || head.field("if-range") == document->tag();
     const std::uint64_t size = document->size();
     const auto range = requestedRange(isSame ? head.field("range") : std::nullopt, size);

@@ -4,6 +4,7 @@
 #include <string>
 
 #include "host/browser/BrowserSite.h"
+#include "host/browser/OrderedArchives.h"
 #include "host/browser/RequestGuard.h"
 #include "host/browser/Sessions.h"
 #include "host/browser/SignedAddresses.h"
@@ -41,6 +42,9 @@ class DocumentBrowserSite final : public BrowserSite {
     [[nodiscard]] BrowserResponse sessions(std::uint64_t ownNumber);
     [[nodiscard]] BrowserResponse endSession(const std::string& number);
     [[nodiscard]] BrowserResponse newAddress(const BrowserRequest& request, std::uint64_t session);
+    [[nodiscard]] BrowserResponse orderArchive(const BrowserRequest& request,
+                                               std::uint64_t session);
+    [[nodiscard]] BrowserResponse archive(std::string_view secret);
     [[nodiscard]] BrowserResponse collection(const ApiRequest& request);
     [[nodiscard]] BrowserResponse tags();
     [[nodiscard]] BrowserResponse putBackPlace(const std::string& item);
@@ -53,6 +57,7 @@ class DocumentBrowserSite final : public BrowserSite {
     const RequestGuard guard_;
     Sessions sessions_;
     const SignedAddresses addresses_;
+    OrderedArchives archives_;
     Uploads uploads_;
 };
 

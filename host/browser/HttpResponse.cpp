@@ -60,6 +60,8 @@ std::string headOf(const BrowserResponse& response, std::optional<std::uint64_t>
     }
     if (length) {
         text += lineOf("Content-Length", std::to_string(*length));
+    } else if (response.source) {
+        text += lineOf("Transfer-Encoding", "chunked");
     }
     text += keepsAlive ? "" : lineOf("Connection", "close");
     return text + "\r\n";

@@ -41,15 +41,17 @@ std::string SignedAddresses::signature(const SignedPlace& place, std::string_vie
                                  std::to_string(place.session) + "\n" + place.item);
 }
 
-std::string SignedAddresses::addressOf(const SignedPlace& place) const {
+std::string SignedAddresses::addressOf(const SignedPlace& place, std::string_view name) const {
     const std::string expiry = std::to_string(secondsOf(now_() + lifetime));
     return "/files/" + std::string(nameOf(place.view)) + "/" + percentEncodedPath(place.item) +
+           (name.empty() ? "" : "/" + percentEncodedPath(name)) +
            "?session=" + std::to_string(place.session) + "&until=" + expiry +
            "&signature=" + signature(place, expiry);
 }
 
 std::optional<SignedPlace> SignedAddresses::placeAt(const ApiRequest& request) const {
-    if (request.path.size() != 3 || request.path[0] != "files") {
+    const std::size_t depth = request.path.size();
+    if (depth < 3 || depth > 4 || request.path[0] != "files") {
         return std::nullopt;
     }
     const auto view = viewNamed(request.path[1]);

@@ -36,8 +36,9 @@ class SignedAddresses {
     explicit SignedAddresses(std::function<Clock::time_point()> now = [] { return Clock::now(); })
         : now_(std::move(now)) {}
 
-    // Begins with "/files/".
-    [[nodiscard]] std::string addressOf(const SignedPlace& place) const;
+    // Begins with "/files/". A name at its end is for people alone: viewers show what an address
+    // ends with.
+    [[nodiscard]] std::string addressOf(const SignedPlace& place, std::string_view name = {}) const;
     // None for an address that is not ours, was changed, or is too old.
     [[nodiscard]] std::optional<SignedPlace> placeAt(const ApiRequest& request) const;
 

@@ -24,6 +24,14 @@ TEST_F(SignedAddressesTest, anAddressLeadsToWhatItWasMadeFor) {
     }
 }
 
+TEST_F(SignedAddressesTest, aNameAtItsEndIsForPeople) {
+    const SignedPlace place{View::content, "did=12", 7};
+    const std::string address = addresses_.addressOf(place, "a b?.pdf\xFF");
+    EXPECT_EQ(address.substr(0, address.find('?')), "/files/content/did%3D12/a%20b%3F.pdf%FF");
+    EXPECT_EQ(placeAt(address), place);
+    EXPECT_FALSE(placeAt("/files/content/did%3D12/a/b" + address.substr(address.find('?'))));
+}
+
 TEST_F(SignedAddressesTest, aChangedAddressLeadsNowhere) {
     const std::string address = addresses_.addressOf({View::download, "did=12", 7});
     const auto changed = [&](const std::string& from, const std::string& to) {

@@ -62,6 +62,13 @@ Started<std::string> CommandContext::stateFolder() const {
     return stateFolderFor(options_.places, environment_);
 }
 
+Started<std::optional<std::string>> CommandContext::namedRootPath() const {
+    if (!options_.places.root && !environment_.variable("MARROWDALE_ROOT")) {
+        return std::nullopt;
+    }
+    return rootPath();
+}
+
 std::expected<WorldOptions, Failure> CommandContext::worldOptions() const {
     auto places = settingsFor(options_.places, environment_);
     if (!places) {
@@ -152,7 +159,7 @@ std::expected<HostRequests*, Failure> CommandContext::liveRequests() {
     });
 }
 
-std::expected<std::unique_ptr<HostService>, Failure> CommandContext::startService() const {
+std::expected<std::unique_ptr<HostService>, Failure> CommandContext::prepareService() const {
     auto options = worldOptions();
     if (!options) {
         return std::unexpected(options.error());
@@ -168,7 +175,7 @@ std::expected<std::unique_ptr<HostService>, Failure> CommandContext::startServic
         return running != nullptr;
     };
     if (!options->isServed()) {
-        auto service = HostService::start(std::move(*options));
+        auto service = HostService::prepare(std::move(*options));
         if (service) {
             return std::move(*service);
         }
@@ -178,6 +185,14 @@ std::expected<std::unique_ptr<HostService>, Failure> CommandContext::startServic
     }
     return std::unexpected(Failure::start(StartFailure::refusal(
         running->serviceProcess() + " serves the state folder " + state + " already")));
+}
+
+std::expected<RemoteRequests*, Failure> CommandContext::runningService() {
+    const auto state = stateFolder();
+    if (!state) {
+        return std::unexpected(Failure::start(state.error()));
+    }
+    return remote_ || connectTo(*state) ? remote_.get() : nullptr;
 }
 
 template <typename LookUp>

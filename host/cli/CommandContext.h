@@ -43,14 +43,18 @@ class CommandContext {
 
     [[nodiscard]] Started<std::string> rootPath() const;
     [[nodiscard]] Started<std::string> stateFolder() const;
+    // The root, where the command line or the environment names one.
+    [[nodiscard]] Started<std::optional<std::string>> namedRootPath() const;
     // Requests to the service that has the state folder or, where none runs, to a provider that is
     // started in this process. The same ones each time; good as long as the context.
     [[nodiscard]] std::expected<HostRequests*, Failure> requests();
     // The same for somebody who stays: the provider in this process then records what happens and
     // is the service of others.
     [[nodiscard]] std::expected<HostRequests*, Failure> liveRequests();
-    // A service in this process. Refused where one runs.
-    [[nodiscard]] std::expected<std::unique_ptr<HostService>, Failure> startService() const;
+    // A service in this process, which answers nobody until it listens. Refused where one runs.
+    [[nodiscard]] std::expected<std::unique_ptr<HostService>, Failure> prepareService() const;
+    // The service that has the state folder; null where none runs. Good as long as the context.
+    [[nodiscard]] std::expected<RemoteRequests*, Failure> runningService();
 
     // Looks an item of the command line up, by the requests above.
     [[nodiscard]] std::expected<ResolvedItem, Failure> resolve(const ItemArgument& item);

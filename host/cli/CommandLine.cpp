@@ -7,6 +7,7 @@
 #include "host/cli/AnchorCommand.h"
 #include "host/cli/AppCommand.h"
 #include "host/cli/AppsCommand.h"
+#include "host/cli/BrowseCommand.h"
 #include "host/cli/ChangesCommand.h"
 #include "host/cli/DeleteCommand.h"
 #include "host/cli/DoctorCommand.h"
@@ -73,6 +74,7 @@ std::vector<std::unique_ptr<Command>> allCommands() {
     commands.push_back(std::make_unique<RefreshCommand>());
     commands.push_back(std::make_unique<ThumbnailCommand>());
     commands.push_back(std::make_unique<ServeCommand>());
+    commands.push_back(std::make_unique<BrowseCommand>());
     commands.push_back(std::make_unique<DoctorCommand>());
     return commands;
 }

@@ -4,10 +4,9 @@
 
 #include <CLI/App.hpp>
 
-#include "host/daemon/ServiceNotification.h"
-#include "host/daemon/StopSignals.h"
-#include "host/requests/HarmlessText.h"
-#include "host/requests/JsonWriter.h"
+#include "host/browser/BrowserService.h"
+#include "host/cli/Serving.h"
+#include "host/daemon/TrashKeeper.h"
 
 namespace marrowdale::host {
 
@@ -36,6 +35,8 @@ void ServeCommand::declareArguments(CLI::App& arguments) {
                         std::to_string(BrowserService::usualPort) + ", or any free one)")
         ->type_name("N");
     arguments.add_flag("--no-browser", withoutBrowser_, "Serve no document browser");
+    arguments.add_flag("--no-address", withoutAddress_,
+                       "Print no address of the document browser: browse asks for one");
     arguments
         .add_option("--keep-trash", keptTrash_,
                     "How long what was trashed is kept (default: 30 days)")
@@ -43,70 +44,19 @@ void ServeCommand::declareArguments(CLI::App& arguments) {
 }
 
 Outcome ServeCommand::run(CommandContext& context) {
-    if (keptTrash_ != forever && !daysIn(keptTrash_)) {
-        return std::unexpected(
-            Failure::commandLine("--keep-trash wants a number of days, or forever"));
+    Serving serving{.port = port_};
+    if (withoutBrowser_ || withoutAddress_) {
+        serving.browser = withoutBrowser_ ? Serving::Browser::none : Serving::Browser::quiet;
     }
-    StopSignals signals;
-    auto service = context.startService();
-    if (!service) {
-        return std::unexpected(service.error());
-    }
-    const auto browser = startBrowser(**service);
-    if (!browser) {
-        return std::unexpected(browser.error());
-    }
-    const auto trashKeeper = startTrashKeeper(**service);
-    signals.begin();
-    tellThatItIsReady(context, **service, browser->get());
-    notifyServiceManager(context.environment(), "READY=1");
-    signals.wait();
-    notifyServiceManager(context.environment(), "STOPPING=1");
-    return {};
-}
-
-std::expected<ServeCommand::Browser, Failure> ServeCommand::startBrowser(
-    HostService& service) const {
-    if (withoutBrowser_) {
-        return nullptr;
-    }
-    auto browser = BrowserService::start(service, port_);
-    if (!browser) {
-        return std::unexpected(Failure::start(StartFailure::from(std::move(browser.error()))));
-    }
-    return std::move(*browser);
-}
-
-std::unique_ptr<TrashKeeper> ServeCommand::startTrashKeeper(HostService& service) const {
-    if (keptTrash_ == forever) {
-        return nullptr;
-    }
-    TrashKeeper::Options options;
-    options.age = std::chrono::days(daysIn(keptTrash_).value_or(0));
-    options.failed = [&service](const Error& error) {
-        service.log().error("can't remove what was trashed long ago; " + error.description());
-    };
-    return std::make_unique<TrashKeeper>(service.requests(), std::move(options));
-}
-
-void ServeCommand::tellThatItIsReady(const CommandContext& context, const HostService& service,
-                                     BrowserService* browser) {
-    const std::string& root = service.settings().rootPath;
-    if (context.json()) {
-        JsonWriter writer;
-        writer.beginObject().key("serving").string(root);
-        if (browser != nullptr) {
-            writer.key("browser").string(browser->newAddress());
+    if (keptTrash_ != forever) {
+        const auto days = daysIn(keptTrash_);
+        if (!days) {
+            return std::unexpected(
+                Failure::commandLine("--keep-trash wants a number of days, or forever"));
         }
-        writer.endObject();
-        context.output().writeLine(writer.take());
-    } else {
-        context.output().writeLine("serving " + harmlessName(root));
-        if (browser != nullptr) {
-            context.output().writeLine("open " + browser->newAddress());
-        }
+        serving.trashAge = std::chrono::days(*days);
     }
-    context.output().flush();
+    return serving.run(context);
 }
 
 }  // namespace marrowdale::host

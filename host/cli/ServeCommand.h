@@ -1,13 +1,10 @@
 #pragma once
 
 #include <cstdint>
-#include <memory>
 #include <optional>
 #include <string>
 
-#include "host/browser/BrowserService.h"
 #include "host/cli/Command.h"
-#include "host/daemon/TrashKeeper.h"
 
 namespace marrowdale::host {
 
@@ -23,15 +20,9 @@ class ServeCommand final : public Command {
     [[nodiscard]] Outcome run(CommandContext& context) override;
 
   private:
-    // Null where none is wanted.
-    using Browser = std::unique_ptr<BrowserService>;
-    [[nodiscard]] std::expected<Browser, Failure> startBrowser(HostService& service) const;
-    [[nodiscard]] std::unique_ptr<TrashKeeper> startTrashKeeper(HostService& service) const;
-    static void tellThatItIsReady(const CommandContext& context, const HostService& service,
-                                  BrowserService* browser);
-
     std::optional<std::uint16_t> port_;
     bool withoutBrowser_ = false;
+    bool withoutAddress_ = false;
     std::string keptTrash_;  // days, or "forever"
 };
 

@@ -173,6 +173,13 @@ Expected<void> RemoteRequests::refreshApplications() {
     return body ? Expected<void>() : Unexpected(body.error());
 }
 
+Expected<std::string> RemoteRequests::newBrowserAddress() {
+    const std::lock_guard lock(mutex_);
+    const auto body =
+        bodyOf(connection_->send({.method = "POST", .target = "/v1/launches", .body = "{}"}));
+    return body ? textFromJson("address", *body) : Unexpected(body.error());
+}
+
 Expected<std::vector<Thumbnail>> RemoteRequests::thumbnails(
     const std::vector<std::string>& identifiers) {
     std::vector<Thumbnail> thumbnails;

@@ -50,6 +50,9 @@ class RemoteRequests final : public HostRequests {
         const std::vector<std::string>& identifiers) override;
     [[nodiscard]] Expected<std::vector<Finding>> findings() override;
 
+    // Where the service's document browser is, for one web browser. ENXIO where it has none.
+    [[nodiscard]] Expected<std::string> newBrowserAddress();
+
   private:
     class Listing;
     RemoteRequests(std::string stateFolder, std::unique_ptr<HttpConnection> connection)

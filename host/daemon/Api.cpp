@@ -143,6 +143,9 @@ ApiAnswer Api::answerTo(const ApiRequest& request) {
     if (path[1] == "refresh" && path.size() == 2) {
         return refresh(request);
     }
+    if (path[1] == "launches" && path.size() == 2) {
+        return launch(request);
+    }
     if (request.method != "GET") {
         return refused(methodNotAllowed, ENOTSUP, "do that to this resource");
     }
@@ -249,6 +252,22 @@ ApiAnswer Api::refresh(const ApiRequest& request) {
     }
     const auto refreshed = requests_.refreshApplications();
     return refreshed ? ApiAnswer{.body = "{}"} : failed(refreshed.error());
+}
+
+void Api::offerBrowser(NewBrowserAddress newAddress) {
+    const MutexLock lock(mutex_);
+    newBrowserAddress_ = std::move(newAddress);
+}
+
+ApiAnswer Api::launch(const ApiRequest& request) {
+    if (request.method != "POST") {
+        return refused(methodNotAllowed, ENOTSUP, "do that to this resource");
+    }
+    const MutexLock lock(mutex_);
+    if (!newBrowserAddress_) {
+        return refused(notFound, ENXIO, "show the document browser, which is not served here");
+    }
+    return {.body = textJson("address", newBrowserAddress_())};
 }
 
 void Api::act(const ApiRequest& request, const std::shared_ptr<ApiReply>& reply) {

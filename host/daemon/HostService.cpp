@@ -5,6 +5,17 @@
 namespace marrowdale::host {
 
 Started<std::unique_ptr<HostService>> HostService::start(WorldOptions options) {
+    auto service = prepare(std::move(options));
+    if (!service) {
+        return service;
+    }
+    if (auto listening = (*service)->listen(); !listening) {
+        return std::unexpected(std::move(listening.error()));
+    }
+    return service;
+}
+
+Started<std::unique_ptr<HostService>> HostService::prepare(WorldOptions options) {
     options.recording = native::StoreOptions::Recording::live;
     auto world = World::open(options);
     if (!world) {
@@ -14,15 +25,17 @@ Started<std::unique_ptr<HostService>> HostService::start(WorldOptions options) {
     if (auto watch = service->startReplica(); !watch) {
         return std::unexpected(StartFailure::from(std::move(watch.error())));
     }
-    service->server_ = HttpServer::start(
-        [&api = service->api_](ApiRequest request, std::shared_ptr<ApiReply> reply) {
-            api.handle(request, reply);
-        });
-    if (auto listening = service->server_->listenInFolder(options.settings.stateFolder);
-        !listening) {
+    return service;
+}
+
+Started<void> HostService::listen() {
+    server_ = HttpServer::start([&api = api_](ApiRequest request, std::shared_ptr<ApiReply> reply) {
+        api.handle(request, reply);
+    });
+    if (auto listening = server_->listenInFolder(settings().stateFolder); !listening) {
         return std::unexpected(StartFailure::from(std::move(listening.error())));
     }
-    return service;
+    return {};
 }
 
 Expected<void> HostService::startReplica() {

@@ -16,6 +16,10 @@ class HostService {
   public:
     // Fails as World::open does, and when the socket can't be made. `options.recording` is live.
     [[nodiscard]] static Started<std::unique_ptr<HostService>> start(WorldOptions options);
+    // The same in two steps, for those who have something to add before anybody else can ask:
+    // nobody is answered until `listen` was called, once.
+    [[nodiscard]] static Started<std::unique_ptr<HostService>> prepare(WorldOptions options);
+    [[nodiscard]] Started<void> listen();
 
     [[nodiscard]] LocalRequests& requests() { return world_->requests(); }
     // What answers programs, for those who take their requests in another way.

@@ -135,19 +135,20 @@ bool LocalActions::isOfTheUsersOwn(const FileProviderItem& item) const {
     return relationship(URL::fileURL(rootPath_), item.fileURL) == URLRelationship::contains;
 }
 
-// What is remembered is on disk before the item moves: a kill in between costs nothing.
+// What is remembered is on disk before the item moves: a kill in between costs nothing. Of an app
+// library's items it is only shown, since the provider remembers them itself.
 Item LocalActions::trash(const ItemAction& action) {
     const auto item = extension_.itemForIdentifier(action.item);
-    const bool isOwn = item && isOfTheUsersOwn(**item) && !(*item)->isTrashed;
-    if (isOwn) {
+    const bool isRemembered = item && !(*item)->isTrashed;
+    if (isRemembered) {
         const auto done = parents_.remember((*item)->itemIdentifier, (*item)->parentItemIdentifier);
-        if (!done) {
+        if (!done && isOfTheUsersOwn(**item)) {
             return Unexpected(done.error());
         }
     }
     auto trashed =
         waitFor([&](auto handler) { extension_.trashItemWithIdentifier(action.item, handler); });
-    if (!trashed && isOwn) {
+    if (!trashed && isRemembered) {
         parents_.forget((*item)->itemIdentifier);
     }
     return trashed;

@@ -29,8 +29,7 @@ class LocalActions {
     [[nodiscard]] Expected<FileProviderItemPtr> perform(const ItemAction& action,
                                                         ActionObserver& observer,
                                                         const std::stop_token& stop);
-    // The folder that a trashed item of the user's own documents goes back to, as far as it is
-    // remembered and there.
+    // The folder that a trashed item goes back to, as far as it is remembered and there.
     [[nodiscard]] std::optional<std::string> putBackParent(std::string_view item);
 
   private:

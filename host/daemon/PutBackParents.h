@@ -9,9 +9,9 @@
 
 namespace marrowdale::host {
 
-// Where trashed items of the user's own documents came from: the provider records that for app
-// libraries alone. On disk, a file an item, named by the item's identifier and holding that of its
-// former parent. Any thread.
+// Where trashed items came from, to be put back there and to be shown; the provider records it for
+// app libraries alone, and tells nobody. On disk, a file an item, named by the item's identifier
+// and holding that of its former parent. Any thread.
 class PutBackParents {
   public:
     // `folder` is made when it is needed.

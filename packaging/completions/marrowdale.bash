@@ -11,14 +11,15 @@ _marrowdale_options() {
     favorite | used) printf '%s\n' --clear ;;
     purge) printf '%s\n' --older-than ;;
     thumbnail) printf '%s\n' --out ;;
-    serve) printf '%s\n' --port --no-browser --keep-trash ;;
+    serve) printf '%s\n' --port --no-browser --no-address --keep-trash ;;
+    browse) printf '%s\n' --no-open ;;
     esac
 }
 
 _marrowdale() {
     local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]} command='' i
     local commands='ls info id path page search anchor changes watch import mkdir rename move trash
-        untrash delete tag favorite used purge apps app refresh thumbnail serve doctor'
+        untrash delete tag favorite used purge apps app refresh thumbnail serve browse doctor'
     COMPREPLY=()
     for ((i = 1; i < COMP_CWORD; i++)); do
         case ${COMP_WORDS[i]} in

@@ -36,7 +36,7 @@ for entry in ls:'List a folder, every page of it' info:'Show everything about on
         apps:'List the applications whose documents appear' \
         app:'Show the folder of an application\'s documents' \
         refresh:'Look for applications that came or went' thumbnail:'Write the icons of items' \
-        serve:'Serve documents until interrupted' doctor:'Say what this machine offers'
+        serve:'Serve documents until interrupted' browse:'Show documents in a web browser' doctor:'Say what this machine offers'
     set -l parts (string split -m 1 : $entry)
     complete -c marrowdale -f -n __marrowdale_needs_command -a $parts[1] -d $parts[2]
 end
@@ -53,4 +53,6 @@ complete -c marrowdale -n '__fish_seen_subcommand_from purge' -l older-than -x
 complete -c marrowdale -n '__fish_seen_subcommand_from thumbnail' -l out -x -a '(__fish_complete_directories)'
 complete -c marrowdale -n '__fish_seen_subcommand_from serve' -l port -x
 complete -c marrowdale -n '__fish_seen_subcommand_from serve' -l no-browser
+complete -c marrowdale -n '__fish_seen_subcommand_from serve' -l no-address
+complete -c marrowdale -n '__fish_seen_subcommand_from browse' -l no-open
 complete -c marrowdale -n '__fish_seen_subcommand_from serve' -l keep-trash -x -a 'forever 7 30 90'

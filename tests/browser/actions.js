@@ -1,7 +1,7 @@
 import assert from "node:assert/strict";
 import { readFile, stat } from "node:fs/promises";
 
-import { sunset } from "./sample.js";
+import { installApplication, print, sunset } from "./sample.js";
 import { run } from "./service.js";
 import { choose, command, names, row, test, until, untilNames } from "./suite.js";
 
@@ -139,6 +139,27 @@ test("Actions.trashIsUndonePutBackAndEmptied", async (stage) => {
   await page.waitForSelector("text=The trash is empty");
 });
 
+test("Actions.whatAnApplicationKeptGoesBackToIt", async (stage) => {
+  const library = await installApplication(stage.home);
+  await stage.serve();
+  const page = await stage.person();
+  await page.getByRole("link", { name: "Notes" }).click();
+  await row(page, "Ideas").dblclick();
+  await untilNames(page, ["First.txt"]);
+  await page.getByRole("button", { name: "Details" }).click();
+  await choose(page, "First.txt");
+  await page.locator(".details dd", { hasText: /^Notes\/Ideas\/First.txt$/ }).waitFor();
+  await page.keyboard.press("Delete");
+  await untilNames(page, []);
+  await page.getByRole("link", { name: "Trash" }).click();
+  await choose(page, "First.txt");
+  await page.locator(".details dt", { hasText: "Was in" }).waitFor();
+  await page.locator(".details dd", { hasText: /^Notes\/Ideas$/ }).waitFor();
+  await command(page, "First.txt", "Put back");
+  await untilNames(page, []);
+  assert.equal(await readFile(library + "/Ideas/First.txt", "utf8"), "An idea.\n");
+});
+
 test("Actions.onlyWhatIsOlderThanTheDateIsEmptied", async (stage) => {
   await stage.home.write("In/a.txt", "a");
   await stage.serve();
@@ -197,10 +218,11 @@ test("Actions.picturesTextSoundAndFilmAreShownActiveContentIsNot", async (stage)
   await stage.home.write("4 drawing.svg",
     "<svg xmlns='http://www.w3.org/2000/svg'><script>document.title = 'ran'</script></svg>");
   await stage.home.write("5 sound.wav", Buffer.concat([Buffer.from("RIFF"), Buffer.alloc(100)]));
-  await stage.home.write("6 print.pdf", "%PDF-1.4\n%%EOF\n");
+  await stage.home.write("6 print.pdf", print("What is printed"));
+  await stage.home.write("7 film.webm", Buffer.alloc(100));
   await stage.serve();
   const page = await stage.person();
-  await until(async () => (await names(page)).length === 6);
+  await until(async () => (await names(page)).length === 7);
   await choose(page, "1 picture.png");
   await page.keyboard.press(" ");
   await until(() => page.locator(".preview-image").evaluate((image) => image.naturalWidth === 480));
@@ -220,7 +242,15 @@ test("Actions.picturesTextSoundAndFilmAreShownActiveContentIsNot", async (stage)
   await page.keyboard.press("Escape");
   await choose(page, "6 print.pdf");
   await page.keyboard.press(" ");
+  // The web browser's own viewer has taken it, and shows it by its name.
   await page.locator("iframe.preview-frame").waitFor();
+  const frame = await until(() => page.frames().find((each) => each.url().includes("/files/content/")));
+  assert.match(frame.url(), /\/6%20print\.pdf\?/);
+  await until(() => frame.evaluate(() => document.contentType === "application/pdf"));
+  await page.keyboard.press("Escape");
+  await choose(page, "7 film.webm");
+  await page.keyboard.press(" ");
+  await page.locator("video").waitFor();
   await page.keyboard.press("Escape");
   assert.notEqual(await page.title(), "ran");
 });

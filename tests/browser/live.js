@@ -1,7 +1,7 @@
 import assert from "node:assert/strict";
 import { rename, rm, writeFile } from "node:fs/promises";
 
-import { Service } from "./service.js";
+import { run, Service } from "./service.js";
 import { choose, names, row, test, until, untilNames } from "./suite.js";
 
 test("Live.whatHappensOutsideIsSeen", async (stage) => {
@@ -107,16 +107,77 @@ test("Live.severalWindowsShareOneStream", async (stage) => {
   }
 });
 
-test("Live.aLostConnectionIsToldAndAnotherServiceWantsANewSession", async (stage) => {
-  await stage.home.write("a.txt", "a");
+test("Live.aLostConnectionIsToldAndTheWindowGoesOnWithTheNextSession", async (stage) => {
+  await stage.home.write("In/a.txt", "a");
+  await stage.home.write("In/b.txt", "b");
   const first = await stage.serve();
   const page = await stage.person();
-  await untilNames(page, ["a.txt"]);
-  assert.equal(await first.stop(), 0);
+  await row(page, "In").dblclick();
+  await untilNames(page, ["a.txt", "b.txt"]);
+  await choose(page, "b.txt");
+  await page.evaluate(() => { window.isTheSame = true; });
+  assert.equal(await first.stop("SIGKILL"), null);
   await page.waitForSelector("text=Connection lost, trying again…");
-  await untilNames(page, ["a.txt"]);
+  await untilNames(page, ["a.txt", "b.txt"]);
+  await stage.home.write("In/c.txt", "c");
+  await rm(stage.home.document("In/a.txt"));
+  // Another process may listen there by now: it is told nothing that is good for more than itself.
   stage.service = await Service.start(stage.home, ["--port", new URL(first.origin).port]);
-  await page.waitForSelector("text=Open the printed address");
+  await page.waitForSelector("text=Open a new address");
+  const [{ browser }] = await run(stage.home, "browse");
+  const other = await page.context().newPage();
+  await other.goto(browser);
+  await untilNames(other, ["In"]);
+  await untilNames(page, ["b.txt", "c.txt"]);
+  assert.ok(await page.evaluate(() => window.isTheSame));
+  assert.equal(await row(page, "b.txt").getAttribute("aria-selected"), "true");
+  assert.ok(await page.locator(".banner").isHidden());
+  await stage.home.write("In/d.txt", "d");
+  await untilNames(page, ["b.txt", "c.txt", "d.txt"]);
+});
+
+test("Live.aServiceThatDoesNotAnswerIsWaitedFor", async (stage) => {
+  await stage.home.write("In/a.txt", "a");
+  await stage.serve();
+  const page = await stage.person();
+  await untilNames(page, ["In"]);
+  stage.service.pause();
+  await row(page, "In").dblclick();
+  await page.waitForSelector("text=Waiting for the service…");
+  stage.service.goOn();
+  await untilNames(page, ["a.txt"]);
+});
+
+test("Live.thatTheHistoryIsBeingCheckedIsToldWhileTheDocumentsTakeLong", async (stage) => {
+  await stage.home.write("In/a.txt", "a");
+  await stage.serve();
+  const page = await stage.person();
+  await untilNames(page, ["In"]);
+  // The documents wait; the service itself answers.
+  let goOn;
+  const isOver = new Promise((resolve) => { goOn = resolve; });
+  await page.route("**/v1/items/**", async (route) => {
+    await isOver;
+    await route.continue();
+  });
+  await row(page, "In").dblclick();
+  await page.waitForSelector("text=The history is being checked…");
+  goOn();
+  await untilNames(page, ["a.txt"]);
+  await page.unroute("**/v1/items/**");
+  // While something is shown, it stays, and the line below tells.
+  let goOnAgain;
+  const isOverAgain = new Promise((resolve) => { goOnAgain = resolve; });
+  await page.route("**/v1/items/**", async (route) => {
+    await isOverAgain;
+    await route.continue();
+  });
+  await stage.home.write("In/b.txt", "b");
+  await page.locator(".status", { hasText: "The history is being checked…" }).waitFor();
+  await untilNames(page, ["a.txt"]);
+  goOnAgain();
+  await untilNames(page, ["a.txt", "b.txt"]);
+  await page.locator(".status", { hasText: "2 items" }).waitFor();
 });
 
 test("Live.anEndedSessionEndsAtOnce", async (stage) => {
@@ -125,8 +186,10 @@ test("Live.anEndedSessionEndsAtOnce", async (stage) => {
   const page = await stage.person();
   await page.getByRole("button", { name: "More" }).click();
   await page.getByRole("menuitem", { name: "Sessions…" }).click();
-  await page.getByRole("dialog", { name: "Sessions" }).getByRole("button", { name: "End" }).click();
-  await page.waitForSelector("text=Open the printed address");
+  const sessions = page.getByRole("dialog", { name: "Sessions" });
+  await sessions.getByText(/^Chrome \d+, Linux$/).waitFor();
+  await sessions.getByRole("button", { name: "End" }).click();
+  await page.waitForSelector("text=Open a new address");
 });
 
 test("Live.ofManyRowsOnlyThoseInSightAreThere", async (stage) => {

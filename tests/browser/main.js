@@ -2,9 +2,12 @@
 
 import { runAll } from "./suite.js";
 
+import "./browse.js";
 import "./security.js";
 import "./places.js";
 import "./actions.js";
+import "./archives.js";
+import "./pictures.js";
 import "./uploads.js";
 import "./live.js";
 import "./keyboard.js";

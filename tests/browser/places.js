@@ -1,6 +1,7 @@
 import assert from "node:assert/strict";
 import { rename } from "node:fs/promises";
 
+import { installApplication } from "./sample.js";
 import { run } from "./service.js";
 import { choose, names, row, test, until, untilNames } from "./suite.js";
 
@@ -13,7 +14,7 @@ test("Places.thePrintedAddressBeginsOneSessionThatAReloadKeeps", async (stage) =
   await page.reload();
   await untilNames(page, ["a.txt"]);
   const other = await stage.open();
-  await other.waitForSelector("text=Open the printed address");
+  await other.waitForSelector("text=Open a new address");
   assert.equal(await other.locator(".item-name").count(), 0);
 });
 
@@ -151,4 +152,69 @@ test("Places.listAndGridShowTheSame", async (stage) => {
   await page.waitForSelector(".tile");
   await page.getByRole("button", { name: "Show as list" }).click();
   await page.waitForSelector(".sizer > .row");
+});
+
+test("Places.aFolderIsFilteredByPartsOfNames", async (stage) => {
+  for (const name of ["Öl.txt", "argument.txt", "bread.txt", "Target.txt"]) {
+    await stage.home.write(`In/${name}`, "");
+  }
+  await stage.serve();
+  const page = await stage.person();
+  await row(page, "In").dblclick();
+  await untilNames(page, ["argument.txt", "bread.txt", "Öl.txt", "Target.txt"]);
+  await choose(page, "bread.txt");
+  await page.getByRole("button", { name: "Filter" }).click();
+  await page.keyboard.type("ARG");
+  await untilNames(page, ["argument.txt", "Target.txt"]);
+  // What is not shown is not selected either.
+  await page.locator(".status", { hasText: "2 of 4 items" }).waitFor();
+  // News is filtered, too.
+  await stage.home.write("In/bargain.txt", "");
+  await stage.home.write("In/milk.txt", "");
+  await untilNames(page, ["argument.txt", "bargain.txt", "Target.txt"]);
+  await page.keyboard.press("ArrowDown");
+  await page.keyboard.press("Control+a");
+  await page.locator(".status", { hasText: "3 of 3 selected" }).waitFor();
+  await page.getByRole("textbox", { name: "Filter" }).fill("nothing like it");
+  await page.waitForSelector("text=Nothing fits the filter");
+  await page.getByRole("button", { name: "Show all" }).click();
+  await until(async () => (await names(page)).length === 6);
+  // Another place begins without one.
+  await page.keyboard.press("Control+i");
+  await page.keyboard.type("milk");
+  await untilNames(page, ["milk.txt"]);
+  await page.locator(".crumbs").getByRole("link", { name: "Documents" }).click();
+  await untilNames(page, ["In"]);
+  assert.ok(await page.getByRole("textbox", { name: "Filter" }).isHidden());
+});
+
+test("Places.whatIsFoundSaysWhereItLies", async (stage) => {
+  await installApplication(stage.home);
+  await stage.home.write("Papers/Old/first letter.txt", "");
+  await stage.serve();
+  const page = await stage.person();
+  await page.getByRole("link", { name: "Notes" }).waitFor();
+  await page.getByRole("searchbox").fill("first");
+  await untilNames(page, ["first letter.txt", "First.txt"]);
+  assert.deepEqual(await page.locator(".item-folder").allTextContents(),
+                   ["Documents/Papers/Old", "Notes/Ideas"]);
+});
+
+test("Places.theSidebarSaysHowMuchIsFree", async (stage) => {
+  await stage.serve();
+  const page = await stage.person();
+  await page.locator(".space", { hasText: /^[\d.,]+ [kMGTP]B free$/ }).waitFor();
+});
+
+test("Places.thePageSpeaksGermanToGermans", async (stage) => {
+  await stage.home.write("In/a.txt", "");
+  await stage.serve();
+  const page = await stage.person({ locale: "de-AT" });
+  assert.equal(await page.locator("html").getAttribute("lang"), "de");
+  await page.getByRole("button", { name: "Hochladen" }).click({ force: true });
+  await page.getByRole("dialog", { name: "Hier nicht möglich" }).waitFor();
+  const source = await (await fetch(stage.service.origin + "/assets/text.js")).text();
+  const keys = (name) => Object.keys(new Function(
+    `return ${new RegExp(`const ${name} = ({[^]*?\n});`).exec(source)[1]}`)()).sort();
+  assert.deepEqual(keys("GERMAN"), keys("ENGLISH"));
 });

@@ -25,6 +25,28 @@ const VIEWS = {
     await page.keyboard.press(" ");
     await page.locator(".preview-image").waitFor();
   },
+  print: async (page) => {
+    await row(page, "Garden").dblclick();
+    await choose(page, "Planting.pdf");
+    await page.keyboard.press(" ");
+    await page.locator(".preview-frame").waitFor();
+    await page.waitForTimeout(1500);  // the viewer of PDF tells nobody when it is done
+  },
+  filter: async (page) => {
+    await row(page, "Garden").dblclick();
+    await row(page, "Hills.png").waitFor();
+    await page.keyboard.press("Control+i");
+    await page.keyboard.type("see");
+    await row(page, "Hills.png").waitFor({ state: "detached" });
+  },
+  library: async (page) => {
+    await page.getByRole("link", { name: "Notes" }).click();
+    await row(page, "Ideas").waitFor();
+  },
+  search: async (page) => {
+    await page.getByRole("searchbox", { name: "Search" }).fill("e");
+    await row(page, "Seeds 2.csv").waitFor();
+  },
   menu: async (page) => {
     await row(page, "Garden").dblclick();
     await row(page, "Plan for spring.md").click({ button: "right" });
@@ -47,10 +69,15 @@ const VIEWS = {
     await page.getByRole("link", { name: "Recents" }).click();
     await page.waitForSelector("text=Nothing opened yet");
   },
+  lost: async (page, origin, service) => {
+    service.pause();
+    await page.getByRole("link", { name: "Recents" }).click();
+    await page.waitForSelector("text=Waiting for the service");
+  },
   ended: async (page) => {
     await page.evaluate(() => localStorage.clear());
     await page.reload();
-    await page.waitForSelector("text=Open the printed address");
+    await page.waitForSelector("text=Open a new address");
   },
 };
 
@@ -67,13 +94,14 @@ async function take(browser, folder, view, show, colorScheme) {
   await page.goto(service.address);
   await row(page, "Lease.pdf").waitFor();
   await page.locator(".place", { hasText: "important" }).waitFor();
-  await show(page, service.origin);
+  await show(page, service.origin, service);
   await page.mouse.move(0, 0);
   await page.evaluate(() => document.fonts.ready);
   await page.locator(".space").evaluateAll(([line]) => { if (line) { line.textContent = "73 GB free"; } });
   const path = join(folder, `browser-${view}-${colorScheme}.png`);
   await page.screenshot({ path, animations: "disabled", caret: "hide" });
   await context.close();
+  service.goOn();
   await service.stop();
   await home.remove();
   return path;

@@ -31,7 +31,14 @@ export class Home {
   }
 
   get environment() {
-    return { HOME: this.path, PATH: process.env.PATH, XDG_DATA_DIRS: "/usr/local/share:/usr/share" };
+    return { HOME: this.path, PATH: `${join(this.path, "bin")}:${process.env.PATH}`,
+             XDG_DATA_DIRS: "/usr/local/share:/usr/share" };
+  }
+
+  // A program of that name is found before those of the system.
+  async installProgram(name, script) {
+    await mkdir(join(this.path, "bin"), { recursive: true });
+    await writeFile(join(this.path, "bin", name), script, { mode: 0o755 });
   }
 
   remove() {
@@ -41,11 +48,11 @@ export class Home {
 
 // `marrowdale serve`, ready when `start` answers.
 export class Service {
-  static async start(home, options = ["--port", "0"]) {
+  static async start(home, options = ["--port", "0"], command = "serve", more = {}) {
     const service = new Service();
     service.home = home;
-    service.child = spawn(program, ["--json", "serve", ...options], {
-      env: home.environment, stdio: ["ignore", "pipe", "pipe"] });
+    service.child = spawn(program, ["--json", command, ...options], {
+      env: { ...home.environment, ...more }, stdio: ["ignore", "pipe", "pipe"] });
     service.errors = "";
     service.child.stderr.on("data", (text) => { service.errors += text; });
     service.ended = new Promise((resolve) => service.child.on("exit", resolve));
@@ -74,8 +81,14 @@ export class Service {
 
 // The program's answers to one command, in the home of a service.
 export function run(home, ...args) {
+  return runWith(home, {}, ...args);
+}
+
+// The same with more variables.
+export function runWith(home, more, ...args) {
   return new Promise((resolve, reject) => {
-    const child = spawn(program, ["--json", ...args], { env: home.environment, cwd: home.root });
+    const child = spawn(program, ["--json", ...args],
+                        { env: { ...home.environment, ...more }, cwd: home.root });
     let output = "";
     let errors = "";
     child.stdout.on("data", (text) => { output += text; });

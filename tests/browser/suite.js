@@ -96,8 +96,13 @@ export function names(page) {
 }
 
 export async function untilNames(page, wanted) {
-  await until(async () => JSON.stringify(await names(page)) === JSON.stringify(wanted),
-              `the names ${JSON.stringify(wanted)} (last: ${JSON.stringify(await names(page))})`);
+  let last = null;
+  await until(async () => {
+    last = JSON.stringify(await names(page));
+    return last === JSON.stringify(wanted);
+  }, `the names ${JSON.stringify(wanted)}`).catch((error) => {
+    throw new Error(`${error.message}; the names were ${last}`);
+  });
 }
 
 export function row(page, name) {

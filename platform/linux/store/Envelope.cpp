@@ -1,7 +1,7 @@
 #include "platform/linux/store/Envelope.h"
 
-#include "platform/linux/store/Bytes.h"
 #include "platform/linux/files/CRC32C.h"
+#include "platform/linux/store/Bytes.h"
 #include "platform/linux/store/StoreDamage.h"
 
 namespace marrowdale::native {

@@ -4,8 +4,8 @@
 #include <array>
 #include <fcntl.h>
 
-#include "platform/linux/store/Bytes.h"
 #include "platform/linux/files/CRC32C.h"
+#include "platform/linux/store/Bytes.h"
 #include "platform/linux/store/StoreDamage.h"
 
 namespace marrowdale::native {

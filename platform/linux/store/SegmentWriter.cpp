@@ -4,8 +4,8 @@
 #include <cstdio>
 #include <fcntl.h>
 
-#include "platform/linux/store/Bytes.h"
 #include "platform/linux/files/CRC32C.h"
+#include "platform/linux/store/Bytes.h"
 
 namespace marrowdale::native {
 

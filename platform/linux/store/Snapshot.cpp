@@ -5,8 +5,8 @@
 #include <cerrno>
 #include <fcntl.h>
 
-#include "platform/linux/store/Bytes.h"
 #include "platform/linux/files/CRC32C.h"
+#include "platform/linux/store/Bytes.h"
 #include "platform/linux/store/DiskFile.h"
 #include "platform/linux/store/Envelope.h"
 #include "platform/linux/store/StoreDamage.h"

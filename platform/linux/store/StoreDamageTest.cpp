@@ -9,8 +9,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "platform/linux/store/Bytes.h"
 #include "platform/linux/files/CRC32C.h"
+#include "platform/linux/store/Bytes.h"
 #include "platform/linux/store/Frame.h"
 #include "platform/linux/store/StoreTestSupport.h"
 
