@@ -25,6 +25,22 @@ bool meetInOneAnother(std::string_view a, std::string_view b) {
     return isAtOrBelow(a, b) || isAtOrBelow(b, a);
 }
 
+// What stands at a library's path. Nothing is asked of what is mounted there or on the
+// application's own folder above it, of which there may be nobody to answer: that is EXDEV.
+Expected<EntryStatus> lookAtLibrary(const std::string& path) {
+    const auto documents = path.rfind('/');
+    const auto application = documents == 0 ? 0 : path.rfind('/', documents - 1);
+    const auto base = holdFolder(path.substr(0, application + 1));
+    const auto folder = base ? holdFolderBeneath(base->get(), path.substr(application + 1))
+                             : Unexpected(base.error());
+    return folder ? statEntry(folder->get(), "") : Unexpected(folder.error());
+}
+
+// Whether the error of a look says that no folder is there.
+bool isMissing(const Error& error) {
+    return error.code == ENOENT || error.code == ENOTDIR || error.code == ELOOP;
+}
+
 }  // namespace
 
 // Of two that get in each other's way the one with the lower key counts, of two with one key the
@@ -96,7 +112,7 @@ RecordedRoots::FolderPointer Store::Core::bound(
     if (before != nullptr && before->path != library.folder.path) {
         before = nullptr;
     }
-    const auto standing = statEntry(AT_FDCWD, library.folder.path.c_str());
+    const auto standing = lookAtLibrary(library.folder.path);
     if (!library.isRefused && before != nullptr && standing && before->isAt(*standing)) {
         return before;
     }
@@ -195,7 +211,7 @@ void Store::Core::noteLibraryProblem(const RecordedRoots::Folder& folder,
         row = isGoodKey(folder.key) ? index_.child(rootRow, folder.storedPath()) : noRow;
     }
     if (row != noRow) {
-        retire(row, statEntry(AT_FDCWD, folder.path.c_str()));
+        retire(row, lookAtLibrary(folder.path));
     }
 }
 
@@ -216,7 +232,7 @@ void Store::Core::retireOthers(std::span<const WantedLibrary> wanted) {
         }
     }
     for (const auto& [row, path] : others) {
-        retire(row, statEntry(AT_FDCWD, path.c_str()));
+        retire(row, lookAtLibrary(path));
     }
 }
 
@@ -226,7 +242,7 @@ void Store::Core::retire(RowNumber row, const Expected<EntryStatus>& standing) {
     const MutexLock lock(mutex_);
     const bool isGone =
         standing ? standing->device == device_ && raw(standing->fileID) != index_.row(row).fileID
-                 : standing.error().code == ENOENT || standing.error().code == ENOTDIR;
+                 : isMissing(standing.error());
     if (isGone) {
         changes_.leave(row);
         return;
