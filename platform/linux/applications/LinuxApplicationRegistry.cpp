@@ -219,7 +219,9 @@ std::shared_ptr<const BundleRecord> LinuxApplicationRegistry::record(std::string
 
 void LinuxApplicationRegistry::enumerateApplications(ApplicationKind kind,
                                                      const RecordBlock& block) {
-    for (const auto& [identifier, found] : rescan()->entries) {
+    // Held: what the block asks a record may lead to another reading.
+    const auto now = rescan();
+    for (const auto& [identifier, found] : now->entries) {
         if (found.kind == kind) {
             block(record(identifier));
         }
