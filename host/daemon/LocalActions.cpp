@@ -72,10 +72,16 @@ Item LocalActions::perform(const ItemAction& action, ActionObserver& observer,
     return ask(action);
 }
 
-// What can't be looked up is left for the extension to refuse.
+// What can't be looked up is left for the extension to refuse. The number of a folder that is gone
+// may be a document's by now, and that one is not what was meant.
 Expected<void> LocalActions::checkCapabilities(const ItemAction& action) {
     const std::uint64_t needed = neededOf(action);
-    const auto item = needed != 0 ? extension_.itemForIdentifier(action.item) : Item(nullptr);
+    const bool namesNumber = action.item.starts_with("fid=");
+    const auto item =
+        needed != 0 || namesNumber ? extension_.itemForIdentifier(action.item) : Item(nullptr);
+    if (namesNumber && item && *item && (*item)->itemIdentifier != action.item) {
+        return Unexpected(errorForNonExistentItem(action.item));
+    }
     if (item && *item && ((*item)->capabilities & needed) != needed) {
         return Unexpected(errorFileWriteNoPermission());
     }

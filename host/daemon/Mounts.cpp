@@ -2,8 +2,9 @@
 
 #include <algorithm>
 #include <fstream>
-#include <iterator>
 #include <ranges>
+#include <sstream>
+#include <utility>
 #include <vector>
 
 namespace marrowdale::host {
@@ -66,7 +67,10 @@ bool holds(const Mount& mount, std::string_view path) {
 
 std::string kernelTable() {
     std::ifstream file("/proc/self/mountinfo", std::ios::binary);
-    return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
+    // As far as it can be read: the stream's own iterators would throw.
+    std::ostringstream text;
+    text << file.rdbuf();
+    return std::move(text).str();
 }
 
 }  // namespace

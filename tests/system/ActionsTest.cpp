@@ -180,6 +180,19 @@ class RefusedActionsTest : public SystemTest {};
 
 MARROWDALE_ON_EACH_FILE_SYSTEM(RefusedActionsTest);
 
+// A folder's number may be given to a document once the folder is gone.
+TEST_P(RefusedActionsTest, aNumberIsNotAnotherNameOfADocument) {
+    writeFile(home_.document("mine"), "x");
+    const Json item = home_.line({"info", home_.document("mine")});
+    const std::string number = "fid=" + std::to_string(item.at("fileID").get<std::uint64_t>());
+    for (const Arguments& arguments :
+         {Arguments{"trash", number}, Arguments{"delete", number},
+          Arguments{"rename", number, "other"}, Arguments{"tag", number, "red"}}) {
+        EXPECT_EQ(home_.error(arguments, 1).at("name"), "noSuchItem") << arguments.front();
+    }
+    EXPECT_EQ(home_.line({"info", home_.document("mine")}), item);
+}
+
 TEST_P(RefusedActionsTest, errorsAreTheSameWithAndWithoutAService) {
     makeFolder(home_.document("folder/inner"));
     writeFile(home_.document("folder/a"), "a");

@@ -37,6 +37,12 @@ bool isFolder(const std::string& path) {
     return status && status->isDirectory();
 }
 
+// Another file system stands at the path. Of one there may be nobody to answer.
+bool isMount(const std::string& path) {
+    const auto status = statEntry(AT_FDCWD, path.c_str());
+    return status && status->isMountPoint;
+}
+
 std::vector<std::string> foldersIn(const std::string& path) {
     std::vector<std::string> names;
     UniqueFD folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
@@ -207,7 +213,10 @@ void ApplicationWatch::wantContainers(std::map<std::string, Interest>& wanted) {
         if (wanted.size() > mostWatches) {
             return;
         }
-        want(wanted, joined(folder, name), std::string(documentsName));
+        // What lies on another volume is not served.
+        if (const std::string application = joined(folder, name); !isMount(application)) {
+            want(wanted, application, std::string(documentsName));
+        }
     }
 }
 

@@ -47,6 +47,20 @@ TEST_F(LinuxApplicationRegistryTest, applicationsComeByKindInTheOrderOfTheirIden
     EXPECT_EQ(nameOf("sub-deep-org.example.C"), "C");
 }
 
+TEST_F(LinuxApplicationRegistryTest, applicationsMayGoWhileTheyAreGoneThrough) {
+    for (int i = 0; i < 100; ++i) {
+        writeFile(userEntry("org.example.A" + std::to_string(100 + i)), entry("A"));
+    }
+    Names seen;
+    registry_.enumerateApplications(user, [&](const auto& record) {
+        seen.push_back(*record->bundleIdentifier());
+        fs::remove(userEntry(seen.back()));
+        EXPECT_EQ(record->dataContainerURL(), std::nullopt);
+    });
+    EXPECT_EQ(seen.size(), 100U);
+    EXPECT_TRUE(identifiers(registry_, user).empty());
+}
+
 TEST_F(LinuxApplicationRegistryTest, theUsersEntryHidesTheSystems) {
     writeFile(systemEntry("org.example.A"), entry("System"));
     EXPECT_EQ(nameOf("org.example.A"), "System");

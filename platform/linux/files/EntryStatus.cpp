@@ -2,8 +2,11 @@
 
 #include <cerrno>
 #include <fcntl.h>
+#include <linux/magic.h>
 #include <linux/stat.h>
+#include <optional>
 #include <sys/stat.h>
+#include <sys/vfs.h>
 
 #include "platform/linux/files/FileHandle.h"
 
@@ -39,27 +42,56 @@ EntryStatus entryStatusOf(const struct statx& found) {
     return status;
 }
 
+Expected<EntryStatus> look(int directory, const char* name, int flags) {
+    struct statx found{};
+    if (::statx(directory, name, flags | AT_NO_AUTOMOUNT, statusFields, &found) != 0) {
+        return Unexpected(errorWithPOSIXCode(errno, "look at", name));
+    }
+    return entryStatusOf(found);
+}
+
+// File systems of this kernel's own, whose answers are never older than the question.
+bool isLocal(std::uint64_t type) {
+    constexpr std::uint64_t xfs = 0x58465342;
+    return type == EXT4_SUPER_MAGIC || type == xfs || type == BTRFS_SUPER_MAGIC ||
+           type == TMPFS_MAGIC || type == F2FS_SUPER_MAGIC;
+}
+
+// Whether `name`, which is no mount point, lies on such a file system.
+bool liesOnLocal(DeviceID device, int directory, const char* name) {
+    static thread_local std::optional<DeviceID> known;
+    static thread_local bool knownIsLocal = false;
+    if (known != device) {
+        struct statfs found{};
+        const int result =
+            directory == AT_FDCWD ? ::statfs(name, &found) : ::fstatfs(directory, &found);
+        knownIsLocal = result == 0 && isLocal(static_cast<std::uint64_t>(found.f_type));
+        known = device;
+    }
+    return knownIsLocal;
+}
+
 }  // namespace
 
 DeviceID deviceOf(std::uint32_t major, std::uint32_t minor) {
     return DeviceID{(major << 20U) | (minor & 0xFFFFFU)};
 }
 
+// What is mounted in a tree may have nobody who answers, and a question to it would wait for ever.
+// The kernel tells of itself that the place is a mount point, which is all that is needed of it.
 Expected<EntryStatus> statEntry(int directory, const char* name) {
-    struct statx found{};
-    const int flags = AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT | (*name == '\0' ? AT_EMPTY_PATH : 0);
-    if (::statx(directory, name, flags, statusFields, &found) != 0) {
-        return Unexpected(errorWithPOSIXCode(errno, "look at", name));
+    if (*name == '\0') {
+        return look(directory, name, AT_SYMLINK_NOFOLLOW | AT_EMPTY_PATH);
     }
-    return entryStatusOf(found);
+    auto found = look(directory, name, AT_SYMLINK_NOFOLLOW | AT_STATX_DONT_SYNC);
+    if (!found || found->isMountPoint || liesOnLocal(found->device, directory, name)) {
+        return found;
+    }
+    return look(directory, name, AT_SYMLINK_NOFOLLOW);
 }
 
 Expected<EntryStatus> statTarget(int directory, const char* name) {
-    struct statx found{};
-    if (::statx(directory, name, AT_NO_AUTOMOUNT, statusFields, &found) != 0) {
-        return Unexpected(errorWithPOSIXCode(errno, "look at", name));
-    }
-    return entryStatusOf(found);
+    return look(directory, name, 0);
 }
 
 Expected<std::uint32_t> handleFingerprint(int directory, const char* name) {

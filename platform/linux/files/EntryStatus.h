@@ -33,8 +33,9 @@ struct EntryStatus {
 [[nodiscard]] DeviceID deviceOf(std::uint32_t major, std::uint32_t minor);
 
 // Looks at `name` in the open folder `directory` (AT_FDCWD for an absolute path; an empty name for
-// the open file itself). Never follows a link, never waits for a mount. Errors: POSIX; the subject
-// is the name.
+// the open file itself). Never follows a link, never waits for a mount: not for one to be made, nor
+// for who serves one, so what is said of a mount point may be old, but for its device. Errors:
+// POSIX; the subject is the name.
 [[nodiscard]] Expected<EntryStatus> statEntry(int directory, const char* name);
 
 // The same for what a final link leads to (every link on the way is followed); `name` is not empty.

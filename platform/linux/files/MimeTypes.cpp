@@ -4,9 +4,9 @@
 #include <charconv>
 #include <cstdlib>
 #include <fstream>
-#include <iterator>
 #include <optional>
 #include <set>
+#include <sstream>
 #include <utility>
 
 namespace marrowdale::native {
@@ -20,7 +20,10 @@ std::string variable(const char* name) {
 
 std::string contentsOf(const std::string& path) {
     std::ifstream file(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
+    // As far as it can be read: the stream's own iterators would throw.
+    std::ostringstream text;
+    text << file.rdbuf();
+    return std::move(text).str();
 }
 
 // Takes the text up to the first `separator` off `rest`.

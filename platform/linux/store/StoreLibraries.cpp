@@ -39,6 +39,22 @@ bool meetsOneOf(const Paths& paths, std::string_view path) {
     return next != paths.end() && isAtOrBelow(*next, path);
 }
 
+// What stands at a library's path. Nothing is asked of what is mounted there or on the
+// application's own folder above it, of which there may be nobody to answer: that is EXDEV.
+Expected<EntryStatus> lookAtLibrary(const std::string& path) {
+    const auto documents = path.rfind('/');
+    const auto application = documents == 0 ? 0 : path.rfind('/', documents - 1);
+    const auto base = holdFolder(path.substr(0, application + 1));
+    const auto folder = base ? holdFolderBeneath(base->get(), path.substr(application + 1))
+                             : Unexpected(base.error());
+    return folder ? statEntry(folder->get(), "") : Unexpected(folder.error());
+}
+
+// Whether the error of a look says that no folder is there.
+bool isMissing(const Error& error) {
+    return error.code == ENOENT || error.code == ENOTDIR || error.code == ELOOP;
+}
+
 }  // namespace
 
 // Of two that get in each other's way the one with the lower key counts, of two with one key the
@@ -111,7 +127,7 @@ RecordedRoots::FolderPointer Store::Core::bound(
     if (before != nullptr && before->path != library.folder.path) {
         before = nullptr;
     }
-    const auto standing = statEntry(AT_FDCWD, library.folder.path.c_str());
+    const auto standing = lookAtLibrary(library.folder.path);
     if (!library.isRefused && before != nullptr && standing && before->isAt(*standing)) {
         return before;
     }
@@ -210,7 +226,7 @@ void Store::Core::noteLibraryProblem(const RecordedRoots::Folder& folder,
         row = isGoodKey(folder.key) ? index_.child(rootRow, folder.storedPath()) : noRow;
     }
     if (row != noRow) {
-        retire(row, statEntry(AT_FDCWD, folder.path.c_str()));
+        retire(row, lookAtLibrary(folder.path));
     }
 }
 
@@ -231,7 +247,7 @@ void Store::Core::retireOthers(std::span<const WantedLibrary> wanted) {
         }
     }
     for (const auto& [row, path] : others) {
-        retire(row, statEntry(AT_FDCWD, path.c_str()));
+        retire(row, lookAtLibrary(path));
     }
 }
 
@@ -241,7 +257,7 @@ void Store::Core::retire(RowNumber row, const Expected<EntryStatus>& standing) {
     const MutexLock lock(mutex_);
     const bool isGone =
         standing ? standing->device == device_ && raw(standing->fileID) != index_.row(row).fileID
-                 : standing.error().code == ENOENT || standing.error().code == ENOTDIR;
+                 : isMissing(standing.error());
     if (isGone) {
         changes_.leave(row);
         return;
