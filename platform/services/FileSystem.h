@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -32,6 +33,13 @@ struct CommonAttributes {
     FileID fileID{};
 };
 
+// What a look at items is to bring along on each URL; see DirectoryEnumerationRequest.
+struct LookRequest {
+    ResourceKeySet keys;
+    std::vector<std::string> attributeNames;
+    bool prefetchStatus = true;
+};
+
 // What the provider asks of the file system. All calls are synchronous and may come from any
 // thread, several at once. Paths are bytes. Errors are POSIX errors with operation and path, but
 // where told.
@@ -56,6 +64,17 @@ class FileSystem {
     // file domain's error 260.
     [[nodiscard]] virtual Expected<ResourceValue> resourceValue(const URL& url,
                                                                 ResourceKey key) = 0;
+
+    // Looks at items as a listing looks at what it finds, those of one folder together: each answer
+    // is the URL anew, with the values asked for brought along as a listing's URLs bring them, and
+    // its folder's number and kind with the folder's URL. Nothing that was cached on the URL given
+    // is used. Document identifiers that are given out are durable when the call returns (one sync
+    // for all). What could not be brought along for an item that is there (a document identifier
+    // on a full disk; anything for a path with "." or "..") is read when somebody asks for it, who
+    // gets the error. An error for an item that can't be looked at, the file domain's 260 for one
+    // that is not there. One answer a URL, in their order.
+    [[nodiscard]] virtual std::vector<Expected<URL>> lookAt(std::span<const URL> urls,
+                                                            const LookRequest& request) = 0;
 
     // The path of a file by its number: the place where it stands now. ENOENT when the volume's
     // served trees hold no such file, ENXIO for another volume.

@@ -41,6 +41,11 @@ class EmptyFileSystem : public FileSystem {
         return Unexpected(Error{ErrorDomain::file, static_cast<int>(FileErrorCode::noSuchFile),
                                 "read a resource of", url.path()});
     }
+    // Brings nothing along, so that what is asked of an item decides.
+    std::vector<Expected<URL>> lookAt(std::span<const URL> urls,
+                                      const LookRequest& /*request*/) override {
+        return {urls.begin(), urls.end()};
+    }
     Expected<std::string> pathForFileID(DeviceID /*device*/, FileID /*file*/) override {
         return Unexpected(errorWithPOSIXCode(ENOENT));
     }

@@ -36,6 +36,20 @@ Expected<ResourceValue> FaultInjectingFileSystem::resourceValue(const URL& url, 
     return answer ? std::move(*answer) : ForwardingFileSystem::resourceValue(url, key);
 }
 
+std::vector<Expected<URL>> FaultInjectingFileSystem::lookAt(std::span<const URL> urls,
+                                                            const LookRequest& request) {
+    if (resourceAnswer || statusAnswer) {
+        return {urls.begin(), urls.end()};
+    }
+    auto answers = ForwardingFileSystem::lookAt(urls, request);
+    for (std::size_t i = 0; i < urls.size(); ++i) {
+        if (const auto fault = ask(lookFault, urls[i])) {
+            answers[i] = Unexpected(*fault);
+        }
+    }
+    return answers;
+}
+
 Expected<std::string> FaultInjectingFileSystem::pathForFileID(DeviceID device, FileID file) {
     auto answer = ask(pathAnswer, device, file);
     return answer ? std::move(*answer) : ForwardingFileSystem::pathForFileID(device, file);

@@ -19,6 +19,7 @@ class FaultInjectingFileSystem : public ForwardingFileSystem {
     std::function<std::optional<Expected<CommonAttributes>>(const URL&)> commonAttributesAnswer;
     std::function<std::optional<Expected<FileStatus>>(const URL&)> statusAnswer;
     std::function<std::optional<Expected<ResourceValue>>(const URL&, ResourceKey)> resourceAnswer;
+    std::function<std::optional<Error>(const URL&)> lookFault;
     std::function<std::optional<Expected<std::string>>(DeviceID, FileID)> pathAnswer;
     std::function<std::optional<Error>(const DirectoryEnumerationRequest&)> enumerateFault;
     std::function<std::optional<Error>(const URL&)> createFault;
@@ -27,6 +28,9 @@ class FaultInjectingFileSystem : public ForwardingFileSystem {
     Expected<CommonAttributes> commonAttributes(const OpenFile& file) override;
     Expected<FileStatus> status(const URL& url) override;
     Expected<ResourceValue> resourceValue(const URL& url, ResourceKey key) override;
+    // Brings nothing along where a value may be the hooks' to answer.
+    std::vector<Expected<URL>> lookAt(std::span<const URL> urls,
+                                      const LookRequest& request) override;
     Expected<std::string> pathForFileID(DeviceID device, FileID file) override;
     Expected<std::unique_ptr<DirectoryEnumerator>> enumerateDirectory(
         const DirectoryEnumerationRequest& request) override;

@@ -19,6 +19,10 @@ class ForwardingFileSystem : public FileSystem {
     Expected<ResourceValue> resourceValue(const URL& url, ResourceKey key) override {
         return target_.resourceValue(url, key);
     }
+    std::vector<Expected<URL>> lookAt(std::span<const URL> urls,
+                                      const LookRequest& request) override {
+        return target_.lookAt(urls, request);
+    }
     Expected<std::string> pathForFileID(DeviceID device, FileID file) override {
         return target_.pathForFileID(device, file);
     }

@@ -66,10 +66,6 @@ bool FolderStack::takeUp(const EntryStatus& atRootPath, ErrorHandler handler) {
            });
 }
 
-bool FolderStack::includes(const EntryStatus& found) const {
-    return found.device == device_ && !found.isMountPoint && !trees_.isPrivate(found);
-}
-
 DirectoryPosition FolderStack::position() const {
     DirectoryPosition position;
     position.atEnd = levels_.empty();
@@ -141,7 +137,7 @@ Expected<FolderStack::Opened> FolderStack::open(std::size_t ancestor, std::size_
         return Unexpected(status.error());
     }
     const bool same = level.folder == FileID{} || level.folder == status->fileID;
-    if (!same || !includes(*status)) {
+    if (!same || !trees_.includes(device_, *status)) {
         return Opened::gone;
     }
     level.folder = status->fileID;

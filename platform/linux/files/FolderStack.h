@@ -63,9 +63,8 @@ class FolderStack {
 
     // The URL the walk began with. Not to be called when empty.
     [[nodiscard]] const URL& rootURL() const { return *levels_.front().url; }
-    // Whether what was found in the innermost folder is part of the walk: neither on another device
-    // or mount, nor a folder that is kept out of the served trees.
-    [[nodiscard]] bool includes(const EntryStatus& found) const;
+    // What lies on another is no part of the walk.
+    [[nodiscard]] DeviceID device() const { return device_; }
 
   private:
     enum class Opened : std::uint8_t { yes, gone };

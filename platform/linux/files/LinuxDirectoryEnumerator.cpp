@@ -34,11 +34,8 @@ LinuxDirectoryEnumerator::LinuxDirectoryEnumerator(const DirectoryEnumerationReq
     : sources_(sources),
       keys_(request.keys),
       options_(request.options),
-      prefetchStatus_(request.prefetchStatus),
-      wantsAccess_(request.keys.contains(ResourceKey::isReadable) ||
-                   request.keys.contains(ResourceKey::isWritable)),
       handler_(request.errorHandler),
-      attributeReader_(request.attributeNames),
+      looks_(request.keys, request.attributeNames, request.prefetchStatus, sources),
       stack_(std::move(stack)) {}
 
 Expected<std::uint64_t> LinuxDirectoryEnumerator::skip(std::uint64_t count) {
@@ -164,43 +161,20 @@ Expected<void> LinuxDirectoryEnumerator::skipEntry(const Entry& entry) {
 Expected<void> LinuxDirectoryEnumerator::takeEntry(const Entry& entry) {
     Pending& pending = pending_.emplace_back();
     pending.name = keepName(entry.name);
+    pending.systemName = pending.name.data();
     pending.folder = batchFolder();
     if (entry.type != DT_DIR && entry.type != DT_UNKNOWN) {
         return {};
     }
-    look(pending);
+    looks_.look(pending, innermost());
     const bool enters = !pending.dropped && pending.error == 0 && pending.status.isDirectory() &&
                         entersFolder(pending.values.isPackage);
     return enters ? enter() : Expected<void>();
 }
 
-void LinuxDirectoryEnumerator::look(Pending& pending) const {
-    pending.looked = true;
-    const auto status = statEntry(stack_.top().reader->descriptor(), pending.cName());
-    if (!status) {
-        pending.dropped = true;
-        pending.error = status.error().code;
-    } else if (!stack_.includes(*status)) {
-        pending.dropped = true;
-    } else {
-        pending.status = *status;
-        describe(pending);
-    }
-}
-
-void LinuxDirectoryEnumerator::describe(Pending& pending) const {
-    const EntryStatus& status = pending.status;
-    pending.values = describeEntry(status, pending.name, keys_, sources_);
-    if (!prefetchStatus_) {
-        return;
-    }
-    if (!status.isSymbolicLink()) {
-        pending.values.hasStatus = true;
-        pending.values.status = fileStatusOf(status, sources_.documents);
-    } else if (const auto target = statTarget(stack_.top().reader->descriptor(), pending.cName())) {
-        pending.values.hasStatus = true;
-        pending.values.status = fileStatusOf(*target, sources_.documents);
-    }
+EntryLooks::Folder LinuxDirectoryEnumerator::innermost() const {
+    const FolderStack::Level& level = stack_.top();
+    return {level.reader->descriptor(), level.mount, stack_.device()};
 }
 
 // A folder that may be read and not searched gives names and nothing else: told once.
@@ -259,38 +233,12 @@ Expected<void> LinuxDirectoryEnumerator::finishFolder() {
     if (count == 0) {
         return {};
     }
-    sources_.work.run(count, [&](std::size_t begin, std::size_t end) {
-        for (Pending& pending : std::span(pending_).subspan(first + begin, end - begin)) {
-            if (!pending.looked) {
-                look(pending);
-            }
-            pending.unread = !pending.dropped && !findAttributes(pending);
-        }
-    });
-    unread_.clear();
+    unfinished_.clear();
     for (Pending& pending : std::span(pending_).subspan(first)) {
-        if (pending.unread) {
-            unread_.push_back(&pending);
-        }
+        unfinished_.push_back(&pending);
     }
-    sources_.calls.inFolder(
-        stack_.top().reader->descriptor(),
-        [this](const AttributeCalls::InFolder& folder) { readAllAttributes(folder); });
+    looks_.finish(unfinished_, innermost(), batchStart_, EntryLooks::Threads::shared);
     return dropUnserved(first);
-}
-
-void LinuxDirectoryEnumerator::readAllAttributes(const AttributeCalls::InFolder& folder) {
-    const auto read = [&](std::size_t begin, std::size_t end) {
-        for (Pending* pending : std::span(unread_).subspan(begin, end - begin)) {
-            readAttributes(*pending, folder);
-        }
-    };
-    // A thread that went into the folder is the only one that can read there.
-    if (sources_.calls.method() == AttributeCalls::Method::worker) {
-        read(0, unread_.size());
-    } else {
-        sources_.work.run(unread_.size(), read);
-    }
 }
 
 Expected<void> LinuxDirectoryEnumerator::dropUnserved(std::size_t first) {
@@ -305,48 +253,6 @@ Expected<void> LinuxDirectoryEnumerator::dropUnserved(std::size_t first) {
                    pending_.end());
     finished_ = pending_.size();
     return goOn;
-}
-
-bool LinuxDirectoryEnumerator::findAttributes(Pending& pending) const {
-    // Links carry no attributes of ours, and their bits say everything.
-    const bool mustList =
-        !pending.status.isSymbolicLink() &&
-        (attributeReader_.asksForNames() ||
-         (wantsAccess_ && dependsOnAccessList(pending.status, sources_.credentials)));
-    if (!mustList) {
-        setAttributes(pending, {});
-        return true;
-    }
-    const auto cached = sources_.attributes.find(pending.status, attributeReader_.fingerprint());
-    if (cached) {
-        setAttributes(pending, *cached);
-    }
-    return cached.has_value();
-}
-
-void LinuxDirectoryEnumerator::readAttributes(Pending& pending,
-                                              const AttributeCalls::InFolder& folder) const {
-    const AttributeReader::Answer answer = attributeReader_.read(folder, pending.cName());
-    if (answer.complete) {
-        sources_.attributes.insert(pending.status, attributeReader_.fingerprint(), answer.found,
-                                   batchStart_);
-    }
-    setAttributes(pending, answer.found);
-}
-
-void LinuxDirectoryEnumerator::setAttributes(Pending& pending, const FoundAttributes& found) const {
-    PrefetchedValues& values = pending.values;
-    values.attributes = found.set ? found.set : attributeReader_.emptySet();
-    if (!wantsAccess_) {
-        return;
-    }
-    const FolderStack::Level& level = stack_.top();
-    const bool ask =
-        found.hasAccessList && dependsOnAccessList(pending.status, sources_.credentials);
-    const Access access = ask ? askAccess(level.reader->descriptor(), pending.cName())
-                              : computeAccess(pending.status, sources_.credentials, level.mount);
-    values.isReadable = access.readable;
-    values.isWritable = access.writable;
 }
 
 Expected<void> LinuxDirectoryEnumerator::assignDocumentIDs() {

@@ -7,16 +7,16 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/linux/files/AttributeReader.h"
+#include "platform/linux/files/EntryLooks.h"
 #include "platform/linux/files/FileSources.h"
 #include "platform/linux/files/FolderStack.h"
 #include "platform/services/DirectoryEnumerator.h"
 
 namespace marrowdale::native {
 
-// The walk: entries are read from open folders, looked at relative to them with one statx each,
-// their attributes listed and the ones asked for read; access is computed. A batch's document
-// identifiers are asked for in one call at its end. Must not outlive what `sources` refers to.
+// The walk: entries are read from open folders, looked at relative to them by EntryLooks,
+// what a folder holds of a batch together. A batch's document identifiers are asked for in one call
+// at its end. Must not outlive what `sources` refers to.
 class LinuxDirectoryEnumerator final : public DirectoryEnumerator {
   public:
     // Errors as FileSystem::enumerateDirectory has them.
@@ -31,18 +31,9 @@ class LinuxDirectoryEnumerator final : public DirectoryEnumerator {
 
   private:
     // An entry of the batch that is being made.
-    struct Pending {
-        PrefetchedValues values;
-        EntryStatus status;
-        int error = 0;           // errno of a failed look
-        bool looked = false;     // `status` and `values` are filled in, or `error` is
-        bool dropped = false;    // not to be handed out
-        bool unread = false;     // its attributes have still to be read
-        std::string_view name;   // in names_, with a NUL behind it
+    struct Pending : LookedEntry {
         std::size_t folder = 0;  // in folders_
         std::optional<URL> url;  // once it is made
-
-        [[nodiscard]] const char* cName() const { return name.data(); }
     };
     struct BatchFolder {
         URL url;
@@ -64,18 +55,13 @@ class LinuxDirectoryEnumerator final : public DirectoryEnumerator {
     [[nodiscard]] Expected<void> takeEntry(const Entry& entry);
     [[nodiscard]] Expected<void> reportEntry(const Error& error);
     [[nodiscard]] Expected<void> enter();
-    void look(Pending& pending) const;
-    void describe(Pending& pending) const;
+    [[nodiscard]] EntryLooks::Folder innermost() const;
 
     void beginBatch();
     [[nodiscard]] std::size_t batchFolder();
     [[nodiscard]] std::string_view keepName(std::string_view name);
     [[nodiscard]] Expected<void> finishFolder();
-    void readAllAttributes(const AttributeCalls::InFolder& folder);
     [[nodiscard]] Expected<void> dropUnserved(std::size_t first);
-    [[nodiscard]] bool findAttributes(Pending& pending) const;
-    void readAttributes(Pending& pending, const AttributeCalls::InFolder& folder) const;
-    void setAttributes(Pending& pending, const FoundAttributes& found) const;
     [[nodiscard]] Expected<void> assignDocumentIDs();
     void makeURLs(std::vector<URL>& urls);
     [[nodiscard]] Unexpected fail(Error error);
@@ -83,10 +69,8 @@ class LinuxDirectoryEnumerator final : public DirectoryEnumerator {
     const FileSources& sources_;
     ResourceKeySet keys_;
     DirectoryEnumerationOptions options_;
-    bool prefetchStatus_;
-    bool wantsAccess_;
     FolderStack::ErrorHandler handler_;
-    AttributeReader attributeReader_;
+    EntryLooks looks_;
     FolderStack stack_;
     std::optional<Error> failure_;  // the walk ended with it
 
@@ -95,7 +79,7 @@ class LinuxDirectoryEnumerator final : public DirectoryEnumerator {
     std::vector<BatchFolder> folders_;
     bool folderIsKnown_ = false;  // the last of folders_ is the innermost folder
     std::vector<DocumentIndex::Request> requests_;
-    std::vector<Pending*> unread_;
+    std::vector<LookedEntry*> unfinished_;
     std::pmr::monotonic_buffer_resource names_;
     Date batchStart_;
 };

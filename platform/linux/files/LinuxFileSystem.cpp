@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "platform/linux/files/EntryValues.h"
+#include "platform/linux/files/ItemLooks.h"
 #include "platform/linux/files/LinuxDirectoryEnumerator.h"
 #include "platform/linux/files/LinuxOpenFile.h"
 
@@ -26,15 +27,6 @@ ResourceKeySet keySet() {
         keys.insert(key);
     }
     return keys;
-}
-
-// Callers tell an item that is not there from one that can't be looked at by the domain.
-Error resourceError(Error error) {
-    if (error.domain == ErrorDomain::posix && (error.code == ENOENT || error.code == ENOTDIR)) {
-        error.domain = ErrorDomain::file;
-        error.code = static_cast<int>(FileErrorCode::noSuchFile);
-    }
-    return error;
 }
 
 void cacheStatusValues(const URL& url, const PrefetchedValues& values) {
@@ -91,14 +83,6 @@ Expected<EntryStatus> statusWithLinks(const Place& place) {
                                               : status;
 }
 
-Mount mountAt(const Place& place) {
-    if (place.isServed()) {
-        return mountOf(place.directory());
-    }
-    const auto item = place.open(O_PATH);
-    return item ? mountOf(item->get()) : Mount::writable;
-}
-
 }  // namespace
 
 Expected<std::unique_ptr<OpenFile>> LinuxFileSystem::openForEvents(const URL& url) {
@@ -140,7 +124,7 @@ Expected<ResourceValue> LinuxFileSystem::resourceValue(const URL& url, ResourceK
     }
     auto value = lookUp(url, key);
     if (!value) {
-        return Unexpected(resourceError(withPath(value.error(), url)));
+        return Unexpected(itemError(value.error(), url));
     }
     return value;
 }
@@ -192,9 +176,14 @@ void LinuxFileSystem::cacheAccess(const URL& url, const Place& place, const Entr
         });
     }
     const Access access = ask ? askAccess(place.directory(), place.name())
-                              : computeAccess(status, sources_.credentials, mountAt(place));
+                              : computeAccess(status, sources_.credentials, place.mount());
     url.setCachedResourceValue(ResourceKey::isReadable, access.readable);
     url.setCachedResourceValue(ResourceKey::isWritable, access.writable);
+}
+
+std::vector<Expected<URL>> LinuxFileSystem::lookAt(std::span<const URL> urls,
+                                                   const LookRequest& request) {
+    return ItemLooks(request, sources_).lookAt(urls);
 }
 
 Expected<std::string> LinuxFileSystem::pathForFileID(DeviceID device, FileID file) {

@@ -18,6 +18,8 @@ class LinuxFileSystem final : public FileSystem {
     [[nodiscard]] Expected<CommonAttributes> commonAttributes(const OpenFile& file) override;
     [[nodiscard]] Expected<FileStatus> status(const URL& url) override;
     [[nodiscard]] Expected<ResourceValue> resourceValue(const URL& url, ResourceKey key) override;
+    [[nodiscard]] std::vector<Expected<URL>> lookAt(std::span<const URL> urls,
+                                                    const LookRequest& request) override;
     [[nodiscard]] Expected<std::string> pathForFileID(DeviceID device, FileID file) override;
     [[nodiscard]] Expected<std::unique_ptr<DirectoryEnumerator>> enumerateDirectory(
         const DirectoryEnumerationRequest& request) override;

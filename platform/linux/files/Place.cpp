@@ -25,6 +25,14 @@ Error asNotServed(Error error) {
 
 }  // namespace
 
+Error itemError(Error error, const URL& url) {
+    if (error.domain == ErrorDomain::posix && (error.code == ENOENT || error.code == ENOTDIR)) {
+        error.domain = ErrorDomain::file;
+        error.code = static_cast<int>(FileErrorCode::noSuchFile);
+    }
+    return withPath(std::move(error), url);
+}
+
 Place::Place(URL url, const ServedTrees& trees, std::string name)
     : url_(std::move(url)), trees_(trees), name_(std::move(name)) {}
 
@@ -36,7 +44,12 @@ Expected<Place> Place::of(const URL& url, const ServedTrees& trees) {
     if (!location) {
         return Unexpected(withPath(location.error(), url));
     }
-    auto place = *location ? inside(url, **location, trees) : outside(url, trees);
+    return at(url, *location, trees);
+}
+
+Expected<Place> Place::at(const URL& url, const std::optional<ServedTrees::Location>& location,
+                          const ServedTrees& trees) {
+    auto place = location ? inside(url, *location, trees) : outside(url, trees);
     if (!place) {
         return Unexpected(withPath(place.error(), url));
     }
@@ -79,6 +92,10 @@ Expected<Place> Place::inside(const URL& url, const ServedTrees::Location& locat
     return place;
 }
 
+std::optional<DeviceID> Place::device() const {
+    return isRoot() ? std::nullopt : device_;
+}
+
 bool Place::hasParent() const {
     return directory_ != AT_FDCWD && !isRoot();
 }
@@ -100,6 +117,14 @@ Expected<UniqueFD> Place::open(int flags) const {
     return opened;
 }
 
+Mount Place::mount() const {
+    if (isServed()) {
+        return mountOf(directory_);
+    }
+    const auto item = open(O_PATH);
+    return item ? mountOf(item->get()) : Mount::writable;
+}
+
 Expected<Place::OpenedFolder> Place::openFolder() const {
     auto folder =
         directory_ == AT_FDCWD ? native::openFolder(name_) : openFolderBeneath(directory_, name_);
@@ -118,8 +143,7 @@ Expected<EntryStatus> Place::checked(const Expected<EntryStatus>& status) const 
         return Unexpected(withPath(status.error(), url_));
     }
     const bool mayLeave = isServed() && !isRoot();
-    if (mayLeave &&
-        (status->device != *device_ || status->isMountPoint || trees_.isPrivate(*status))) {
+    if (mayLeave && !trees_.includes(*device_, *status)) {
         return Unexpected(errorWithPOSIXCode(ENOENT, "look at", url_.path()));
     }
     return status;

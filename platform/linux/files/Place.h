@@ -7,11 +7,16 @@
 
 #include "platform/foundation/Error.h"
 #include "platform/foundation/URL.h"
+#include "platform/linux/files/Access.h"
 #include "platform/linux/files/EntryStatus.h"
 #include "platform/linux/files/ServedTrees.h"
 #include "platform/linux/files/UniqueFD.h"
 
 namespace marrowdale::native {
+
+// The error of a look at an item as callers tell one that is not there from one that can't be
+// looked at: the file domain's 260 for the former. The subject is the URL's path.
+[[nodiscard]] Error itemError(Error error, const URL& url);
 
 // An item's path in the form that system calls take: an open folder and a name in it.
 //
@@ -24,6 +29,10 @@ class Place {
   public:
     // EINVAL for a URL that is no file URL. Must not outlive the trees.
     [[nodiscard]] static Expected<Place> of(const URL& url, const ServedTrees& trees);
+    // The same for a file URL that was located.
+    [[nodiscard]] static Expected<Place> at(const URL& url,
+                                            const std::optional<ServedTrees::Location>& location,
+                                            const ServedTrees& trees);
 
     [[nodiscard]] int directory() const { return directory_; }
     // "." for the root of a served tree.
@@ -31,6 +40,10 @@ class Place {
     [[nodiscard]] bool isServed() const { return device_.has_value(); }
     // Whether `directory` is the folder that the item is in.
     [[nodiscard]] bool hasParent() const;
+    // The device that the item must lie on to be served; none for a root and outside.
+    [[nodiscard]] std::optional<DeviceID> device() const;
+    // Whether the item's mount refuses writing.
+    [[nodiscard]] Mount mount() const;
 
     // Looks at the item itself. Calls that take `directory` and `name` only come after it.
     [[nodiscard]] Expected<EntryStatus> look() const;

@@ -135,6 +135,19 @@ Expected<std::optional<ServedTrees::Location>> ServedTrees::locate(std::string_v
     if (!root->isAt(*stands)) {
         return Unexpected(notServed(root->path));
     }
+    return std::optional(locationIn(std::move(root), path));
+}
+
+Expected<std::optional<ServedTrees::Location>> ServedTrees::locate(std::string_view path,
+                                                                   const Location& beside) const {
+    auto root = rootOf(path);
+    return root != nullptr && root == beside.keptOpen
+               ? std::optional(locationIn(std::move(root), path))
+               : locate(path);
+}
+
+ServedTrees::Location ServedTrees::locationIn(std::shared_ptr<const Folder> root,
+                                              std::string_view path) {
     Location location;
     location.root = root->held.get();
     location.device = root->device;
@@ -143,7 +156,7 @@ Expected<std::optional<ServedTrees::Location>> ServedTrees::locate(std::string_v
         location.relativePath = path.substr(root->path.size() + 1);
     }
     location.keptOpen = std::move(root);
-    return std::optional(std::move(location));
+    return location;
 }
 
 Expected<UniqueFD> ServedTrees::holdFolder(const Location& location,
@@ -177,6 +190,15 @@ Expected<UniqueFD> ServedTrees::holdInSteps(int root, const std::string& relativ
 bool ServedTrees::isPrivate(const EntryStatus& status) const {
     return status.isDirectory() &&
            std::ranges::any_of(private_, [&](const Folder& folder) { return folder.isAt(status); });
+}
+
+bool ServedTrees::includes(DeviceID device, const EntryStatus& found) const {
+    return found.device == device && !found.isMountPoint && !isPrivate(found);
+}
+
+bool ServedTrees::holds(std::string_view path) const {
+    const auto root = rootOf(path);
+    return root != nullptr && path.size() > root->path.size();
 }
 
 }  // namespace marrowdale::native

@@ -48,6 +48,10 @@ class ServedTrees {
     // name; no value outside of all of them. ENOENT where the folder at the root's path is not the
     // one that was there at first (it was moved away, or made anew).
     [[nodiscard]] Expected<std::optional<Location>> locate(std::string_view path) const;
+    // The same beside a place that was located just now: their root, where it is the same, is not
+    // looked at again.
+    [[nodiscard]] Expected<std::optional<Location>> locate(std::string_view path,
+                                                           const Location& beside) const;
 
     // Opens the folder of that relative path as a place to look names up in. ENOENT for what is not
     // served, ENOTDIR for what is no folder.
@@ -56,6 +60,12 @@ class ServedTrees {
 
     // Whether this is one of the private folders. No system call.
     [[nodiscard]] bool isPrivate(const EntryStatus& status) const;
+    // Whether what was found below a root on that device is served: neither on another device, nor
+    // a mount, nor a private folder. No system call.
+    [[nodiscard]] bool includes(DeviceID device, const EntryStatus& found) const;
+    // Whether the absolute path without "." and ".." lies below a root and is none itself, by name
+    // alone: all such paths in one folder lie below the same root. No system call.
+    [[nodiscard]] bool holds(std::string_view path) const;
 
   private:
     struct Folder {
@@ -68,6 +78,8 @@ class ServedTrees {
         [[nodiscard]] bool isAt(const EntryStatus& status) const;
     };
 
+    [[nodiscard]] static Location locationIn(std::shared_ptr<const Folder> root,
+                                             std::string_view path);
     [[nodiscard]] static Folder open(const std::string& path);
     [[nodiscard]] static bool liesBelow(const Folder& inner, const Folder& outer);
     [[nodiscard]] std::shared_ptr<const Folder> openRoot(const std::string& path) const;
