@@ -7,6 +7,7 @@
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/fs/FSEventReader.h"
 #include "providers/marrowdale/fs/FSListedItems.h"
+#include "providers/marrowdale/items/ItemLook.h"
 #include "providers/marrowdale/items/LocalItem.h"
 #include "providers/marrowdale/items/ProviderError.h"
 

@@ -8,6 +8,7 @@
 #include "providers/marrowdale/fs/FSChangesFilter.h"
 #include "providers/marrowdale/fs/FSListedItems.h"
 #include "providers/marrowdale/fs/FSNewestDeletion.h"
+#include "providers/marrowdale/items/ItemLook.h"
 
 namespace marrowdale {
 

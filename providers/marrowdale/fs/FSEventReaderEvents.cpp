@@ -13,6 +13,9 @@ namespace marrowdale {
 
 namespace {
 
+// As many events are looked at together as an answer to a host has changes, and none that a
+// delegate which stops there will not be told of.
+constexpr std::size_t lookAhead = 200;
 constexpr std::string_view documentPathMark = ".docid/";
 constexpr std::string_view documentPathFormat = "/.docid/$dev/changed/$docid/src=$src,dst=$dst";
 
@@ -39,26 +42,6 @@ bool isHiddenBelow(const URL& root, const URL& url) {
     return url.path().find("/.", begin) != std::string::npos;
 }
 
-// What stands at a place: the entry itself, where it is a link too.
-struct Entry {
-    bool exists = false;
-    std::optional<FileID> fileID;
-};
-
-// What the look brings is cached on the URL, so the item that is made of it costs no second one.
-Entry entryAt(const Platform& platform, const URL& url) {
-    const auto value = platform.fileSystem.resourceValue(url, ResourceKey::fileID);
-    if (!value) {
-        const Error& error = value.error();
-        const bool isMissing = error.domain == ErrorDomain::file &&
-                               error.code == static_cast<int>(FileErrorCode::noSuchFile);
-        return {.exists = !isMissing, .fileID = {}};
-    }
-    const auto* number = std::get_if<Number>(&*value);
-    const auto fileID = number ? unsignedValue(*number) : std::nullopt;
-    return {.exists = true, .fileID = fileID ? std::optional(FileID{*fileID}) : std::nullopt};
-}
-
 std::shared_ptr<LocalItem> makeItem(const Platform& platform, const URL& url) {
     return LocalItem::initWithURL(platform, url,
                                   {.customItemID = {},
@@ -72,20 +55,22 @@ std::shared_ptr<LocalItem> makeItem(const Platform& platform, const URL& url) {
 
 void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> events) {
     logDecision([&] { return "fsevent: received " + std::to_string(events.size()) + " events"; });
-    if (delegate_.lock() && !run.isStopped) {
-        allocateDocuments(events);
-    }
-    for (const FileEvent& event : events) {
+    std::optional<FSEventLooks> looks;
+    for (std::size_t i = 0; i < events.size(); ++i) {
+        const FileEvent& event = events[i];
         const auto delegate = delegate_.lock();
         if (!delegate || run.isStopped) {
             return;
+        }
+        if (i % lookAhead == 0) {
+            looks.emplace(looksAt(events.subspan(i, std::min(lookAhead, events.size() - i))));
         }
         std::optional<LogSection> section;
         if (verbose_) {
             section.emplace(platform_.log,
                             [&] { return " fsevents: " + marrowdale::description(event); });
         }
-        if (!handle(run, *delegate, event)) {
+        if (!handle(run, *delegate, event, *looks)) {
             return;
         }
         if (!says(event, FileEventFlag::eventIDsWrapped)) {
@@ -94,21 +79,23 @@ void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> event
     }
 }
 
-// All at once, because each would cost a sync of the disk. What fails here fails, and is told,
-// where the item is made.
-void FSEventReader::allocateDocuments(std::span<const FileEvent> events) const {
-    std::vector<std::string> paths;
+// What stands at the events' places, looked at together: folders are opened once each, and document
+// identifiers are given out with one sync of the disk.
+FSEventLooks FSEventReader::looksAt(std::span<const FileEvent> events) const {
+    std::vector<URL> places;
+    places.reserve(events.size());
     for (const FileEvent& event : events) {
-        const bool isOfFile = event.path && !event.path->empty() &&
-                              !says(event, FileEventFlag::gone | FileEventFlag::isFolder |
-                                               FileEventFlag::documentMoved);
-        if (isOfFile && placeOf(URL::fileURL(*event.path)) == Place::visible) {
-            paths.push_back(*event.path);
+        const bool hasPlace =
+            event.path && !event.path->empty() && !says(event, FileEventFlag::documentMoved);
+        if (!hasPlace) {
+            continue;
+        }
+        // Made anew, so that nothing that was cached for the path is taken for what is there now.
+        if (URL place = URL::fileURL(*event.path); placeOf(place) == Place::visible) {
+            places.push_back(std::move(place));
         }
     }
-    if (paths.size() > 1) {
-        (void)platform_.generationStore.allocatePermanentStorage(paths);
-    }
+    return {platform_, places};
 }
 
 // Runs of the reader follow each other on one queue, so no two of these meet.
@@ -118,8 +105,8 @@ void FSEventReader::countAsProcessed(EventID eventID) {
     }
 }
 
-bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate,
-                           const FileEvent& event) const {
+bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate, const FileEvent& event,
+                           const FSEventLooks& looks) const {
     if (says(event, FileEventFlag::eventIDsWrapped)) {
         if (verbose_) {
             platform_.log.info([] { return "fsevents id wrapped"; });
@@ -142,27 +129,25 @@ bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate,
     if (concernsTheStream && !event.path) {
         return true;
     }
-    return !run.isStopped && handlePath(run, delegate, event);
+    return !run.isStopped && handlePath(run, delegate, event, looks);
 }
 
 bool FSEventReader::handlePath(const Run& run, FSEventReaderDelegate& delegate,
-                               const FileEvent& event) const {
+                               const FileEvent& event, const FSEventLooks& looks) const {
     if (!event.path || event.path->empty()) {
         platform_.log.error("ignore event " + marrowdale::description(event) +
                             " because no path can be extracted");
         return true;
     }
     if (mode_ == FSEventReaderMode::docIDBased && event.path->contains(documentPathMark)) {
-        return handleDocumentPath(run, delegate, event);
+        return handleDocumentPath(run, delegate, event, looks);
     }
-    // Made anew for each event, so that nothing that was cached for the path is taken for what is
-    // there now.
-    return handleURL(run, delegate, event, URL::fileURL(*event.path),
-                     Comparison::withTheEventsFile);
+    return handleURL(run, delegate, event, URL::fileURL(*event.path), Comparison::withTheEventsFile,
+                     looks);
 }
 
 bool FSEventReader::handleDocumentPath(const Run& run, FSEventReaderDelegate& delegate,
-                                       const FileEvent& event) const {
+                                       const FileEvent& event, const FSEventLooks& looks) const {
     DocIDChange change;
     if (!parseDocIDChangePath(*event.path, change)) {
         platform_.log.error("can't parse docID path " + quoted(*event.path) +
@@ -181,7 +166,7 @@ bool FSEventReader::handleDocumentPath(const Run& run, FSEventReaderDelegate& de
             [&] { return "dropping fsevent at " + url->path() + "; URL is not monitored"; });
         return tellOutOfSight(run, delegate, event, *url);
     }
-    return handleURL(run, delegate, event, *url, Comparison::none);
+    return handleURL(run, delegate, event, *url, Comparison::none, looks);
 }
 
 // What a package holds is no item, though its documents keep their identifiers.
@@ -201,7 +186,8 @@ bool FSEventReader::isInPackage(const URL& url) const {
 }
 
 bool FSEventReader::handleURL(const Run& run, FSEventReaderDelegate& delegate,
-                              const FileEvent& event, const URL& url, Comparison comparison) const {
+                              const FileEvent& event, const URL& url, Comparison comparison,
+                              const FSEventLooks& looks) const {
     switch (placeOf(url)) {
         case Place::hidden:
             logDecision([&] { return "dropping fsevent at " + url.path() + "; URL is hidden"; });
@@ -213,13 +199,13 @@ bool FSEventReader::handleURL(const Run& run, FSEventReaderDelegate& delegate,
         case Place::visible:
             break;
     }
-    const Entry entry = entryAt(platform_, url);
+    const FSEventLooks::Entry entry = looks.entryAt(url);
     if (!entry.exists) {
         return tellDeletions(run, delegate, event, url);
     }
     const bool isOther = comparison == Comparison::withTheEventsFile && event.fileID &&
                          entry.fileID && *entry.fileID != *event.fileID;
-    return handleItem(run, delegate, event, url, isOther ? entry.fileID : std::nullopt);
+    return handleItem(run, delegate, event, entry.url, isOther ? entry.fileID : std::nullopt);
 }
 
 // `otherFile` is the file that stands at the URL, where it is not the event's own.

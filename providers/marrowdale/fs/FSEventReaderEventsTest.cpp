@@ -1,5 +1,8 @@
+#include <cerrno>
 #include <filesystem>
+#include <set>
 
+#include "platform/testing/ForwardingFileSystem.h"
 #include "providers/marrowdale/fs/FSEventReaderTestWorld.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 
@@ -42,6 +45,64 @@ TEST_P(FSEventReaderEventsTest, anItemIsMadeAnewForEachEvent) {
     ASSERT_EQ(delegate_->items.size(), 2U);
     EXPECT_EQ(delegate_->items[0]->documentSize, 1U);
     EXPECT_EQ(delegate_->items[1]->documentSize, 2U);
+}
+
+// Counts the looks, and how many items each was for.
+class LookCounter : public ForwardingFileSystem {
+  public:
+    using ForwardingFileSystem::ForwardingFileSystem;
+    std::vector<std::size_t> looks;
+
+    std::vector<Expected<URL>> lookAt(std::span<const URL> urls,
+                                      const LookRequest& request) override {
+        looks.push_back(urls.size());
+        return ForwardingFileSystem::lookAt(urls, request);
+    }
+};
+
+TEST_P(FSEventReaderEventsTest, theItemsOfABatchAreLookedAtTogether) {
+    reader_->stop();
+    LookCounter counter(world_.fileSystem);
+    const Platform platform = withFileSystem(platform_, counter);
+    reader_ = FSEventReader::make(platform, options());
+    reader_->start();
+    for (const char* name : {"f/a", "f/b", "g/c"}) {
+        makeFolder(world_.path(std::string_view(name).substr(0, 1)));
+        writeFile(world_.path(name), name);
+    }
+    tell({event("f/a", FileEventFlag::changed), event("g/c", FileEventFlag::appeared),
+          gone("f/none", FileID{5}), event(".hidden", FileEventFlag::changed),
+          event("f/b", FileEventFlag::changed), event("f/a", FileEventFlag::changed)});
+    EXPECT_EQ(delegate_->told,
+              (Lines{"change a 11", "change c 12", "delete fid=5 " + world_.path("f/none") + " 13",
+                     "change b 15", "change a 16"}));
+    EXPECT_EQ(counter.looks, std::vector<std::size_t>{5});
+    reader_->stop();
+    reader_.reset();
+}
+
+// Both ways to read it must fail before an item that stands there is left out.
+TEST_P(FSEventReaderEventsTest, whatTheLookOfABatchFailsForIsAskedForAlone) {
+    writeFile(world_.path("a"), "1");
+    world_.fileSystem.lookFault = [&](const URL& url) {
+        return url == world_.url("a") ? std::optional(errorWithPOSIXCode(EIO)) : std::nullopt;
+    };
+    tell({event("a", FileEventFlag::changed, fileIDOf("a"))});
+    EXPECT_EQ(delegate_->told, Lines{"change a 11"});
+}
+
+TEST_P(FSEventReaderEventsTest, documentsOfABatchAreGivenOutTogether) {
+    for (const char* name : {"a", "b", "c"}) {
+        writeFile(world_.path(name), "");
+    }
+    tell({event("a", FileEventFlag::appeared), event("b", FileEventFlag::appeared),
+          event("c", FileEventFlag::appeared)});
+    std::set<std::string> identifiers;
+    for (const auto& item : delegate_->items) {
+        EXPECT_TRUE(item->itemIdentifier.starts_with("did=")) << item->itemIdentifier;
+        identifiers.insert(item->itemIdentifier);
+    }
+    EXPECT_EQ(identifiers.size(), 3U);
 }
 
 TEST_P(FSEventReaderEventsTest, itemsCarryTheBundleIdentifierOfTheirLibrary) {

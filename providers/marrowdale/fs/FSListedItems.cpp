@@ -6,11 +6,6 @@
 
 namespace marrowdale {
 
-std::vector<std::string> listedAttributeNames() {
-    return {std::string(LocalItem::xattrLastUsedDateName), std::string(LocalItem::xattrTagDataName),
-            std::string(LocalItem::xattrFavoriteRankName)};
-}
-
 std::vector<std::shared_ptr<LocalItem>> itemsOfListing(const Platform& platform,
                                                        const std::vector<URL>& urls) {
     ParentFolderCache parents(platform);

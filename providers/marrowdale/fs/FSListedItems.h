@@ -1,7 +1,6 @@
 #pragma once
 
 #include <memory>
-#include <string>
 #include <vector>
 
 #include "platform/Platform.h"
@@ -9,9 +8,6 @@
 #include "providers/marrowdale/items/LocalItem.h"
 
 namespace marrowdale {
-
-// The extended attributes that a walk brings along for the items' sake.
-[[nodiscard]] std::vector<std::string> listedAttributeNames();
 
 // The items of the URLs that a walk handed out, as a host is told of them; what can't be served is
 // left out.

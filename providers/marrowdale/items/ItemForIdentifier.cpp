@@ -1,6 +1,7 @@
 #include "providers/marrowdale/items/ItemForIdentifier.h"
 
 #include "platform/hostframework/FileProviderConstants.h"
+#include "providers/marrowdale/items/ItemLook.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 
 namespace marrowdale {
@@ -14,7 +15,7 @@ std::shared_ptr<LocalItem> temporaryLocalFolderItem(const Platform& platform) {
         platform.log.error("can't create temporary directory; " + made.error().description());
         return nullptr;
     }
-    return LocalItem::initWithURL(platform, url);
+    return LocalItem::initWithURL(platform, lookedAt(platform, url));
 }
 
 }  // namespace
@@ -28,7 +29,7 @@ std::shared_ptr<LocalItem> itemForIdentifierString(const Platform& platform,
         return temporaryLocalFolderItem(platform);
     }
     const auto url = fileURLWithItemIdentifier(platform, identifier);
-    return url ? LocalItem::initWithURL(platform, *url) : nullptr;
+    return url ? LocalItem::initWithURL(platform, lookedAt(platform, *url)) : nullptr;
 }
 
 std::shared_ptr<LocalAppLibraryItem> appLibraryItemForIdentifier(const Platform& platform,

@@ -2,6 +2,7 @@
 
 #include "platform/hostframework/FileProviderConstants.h"
 #include "providers/marrowdale/items/ItemForIdentifier.h"
+#include "providers/marrowdale/items/ItemLook.h"
 #include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
 #include "providers/marrowdale/items/ProviderError.h"
 
@@ -34,6 +35,26 @@ Expected<std::shared_ptr<LocalItem>> lookUpItem(const Platform& platform,
     return item;
 }
 
+struct Identified {
+    std::optional<std::string> identifier;
+    std::shared_ptr<LocalItem> item;  // that has it; null for an app library
+};
+
+Identified identifyItemAt(const Platform& platform, const URL& url) {
+    if (url.lastPathComponent() == documentsName) {
+        return {
+            .identifier = MRWFileObjectIdentifier::fromAppLibraryDataContainerURL(platform, url),
+            .item = nullptr};
+    }
+    // What a listing handed out was looked at already.
+    auto item = LocalItem::initWithURL(platform, url.prefetched() ? url : lookedAt(platform, url));
+    if (!item) {
+        return {};
+    }
+    platform.log.debug([&] { return "found " + item->itemIdentifier; });
+    return {.identifier = item->itemIdentifier, .item = std::move(item)};
+}
+
 }  // namespace
 
 Expected<URL> urlOfItem(const Platform& platform, std::string_view itemIdentifier) {
@@ -42,7 +63,7 @@ Expected<URL> urlOfItem(const Platform& platform, std::string_view itemIdentifie
         return Unexpected(errorForNonExistentItem(itemIdentifier));
     }
     platform.log.debug([&] { return "found " + std::string(itemIdentifier); });
-    return item->fileURL;
+    return item->fileURL.withoutCachedValues();
 }
 
 Expected<URL> fetchURLOfItem(const Platform& platform, std::string_view itemIdentifier) {
@@ -52,15 +73,7 @@ Expected<URL> fetchURLOfItem(const Platform& platform, std::string_view itemIden
 }
 
 std::optional<std::string> identifierOfItemAt(const Platform& platform, const URL& url) {
-    if (url.lastPathComponent() == documentsName) {
-        return MRWFileObjectIdentifier::fromAppLibraryDataContainerURL(platform, url);
-    }
-    const auto item = LocalItem::initWithURL(platform, url);
-    if (!item) {
-        return std::nullopt;
-    }
-    platform.log.debug([&] { return "found " + item->itemIdentifier; });
-    return item->itemIdentifier;
+    return identifyItemAt(platform, url).identifier;
 }
 
 std::optional<std::string> fetchIdentifierOfItemAt(const Platform& platform, const URL& url) {
@@ -78,7 +91,7 @@ Expected<std::shared_ptr<LocalItem>> fetchItem(const Platform& platform,
 }
 
 Expected<std::shared_ptr<LocalItem>> itemAtURL(const Platform& platform, const URL& url) {
-    const auto identifier = identifierOfItemAt(platform, url);
+    auto [identifier, item] = identifyItemAt(platform, url);
     if (!identifier) {
         platform.log.error("identifier lookup failed for URL " + quoted(url.absoluteString()));
         return Unexpected(
@@ -87,7 +100,10 @@ Expected<std::shared_ptr<LocalItem>> itemAtURL(const Platform& platform, const U
     if (identifier->starts_with('#') || *identifier == VantrelTemporaryLocalFolderItemIdentifier) {
         return lookUpItem(platform, *identifier);
     }
-    auto item = LocalItem::initWithURL(platform, url);
+    // From the same look it would be the same once more.
+    if (!item->fileURL.prefetched()) {
+        item = LocalItem::initWithURL(platform, url);
+    }
     if (!item) {
         platform.log.error("can't create item for URL " + quoted(url.absoluteString()));
         return Unexpected(
