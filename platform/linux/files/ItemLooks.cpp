@@ -65,7 +65,7 @@ void ItemLooks::sort(std::span<const URL> urls) {
                 sources_.trees.holds(url.path()) ? folderPath(url) : std::string_view(), &url);
         }
     }
-    std::ranges::stable_sort(sorted, {}, &std::pair<std::string_view, const URL*>::first);
+    std::ranges::sort(sorted);
     items_.reserve(sorted.size());
     for (const auto& [folder, url] : sorted) {
         Item& item = items_.emplace_back();
