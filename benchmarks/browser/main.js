@@ -9,6 +9,7 @@ import { serveBarePage } from "./bare-page.js";
 const count = Number(process.argv[2]);
 const ROUNDS = Number(process.argv[3] ?? 3);
 const CHANGES = 40;
+const PATIENCE = 300_000;  // the index of names is made anew first
 
 const OURS = { rows: ".sizer > .row", scroller: ".items" };
 const BARE = { rows: "#rows > .row", scroller: "#rows" };
@@ -64,12 +65,14 @@ for (let i = 0; i < count; ++i) {
   await writeFile(`${folder}/file ${String(i).padStart(6, "0")}.txt`, "");
 }
 const service = await Service.start(home);
+process.on("exit", () => service.child.kill());  // where something failed on the way
 const [{ itemIdentifier }] = await run(home, "id", folder);
 const bare = await serveBarePage(folder);
 // Each in a web browser of its own: a window behind another one gets no frames.
 const browsers = [await launch(), await launch()];
 const [page, other] = await Promise.all(browsers.map((browser) =>
   browser.newPage({ viewport: { width: 1100, height: 700 } })));
+page.setDefaultTimeout(PATIENCE);
 await page.goto(service.address);
 await page.waitForSelector(OURS.rows);
 
