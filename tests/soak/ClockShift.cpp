@@ -40,6 +40,7 @@ void addShift(timespec& time) {
 
 }  // namespace
 
+// NOLINTBEGIN(readability-inconsistent-declaration-parameter-name): the system's names are its own
 extern "C" __attribute__((visibility("default"))) int clock_gettime(clockid_t clock,
                                                                     timespec* time) noexcept {
     using Call = int (*)(clockid_t, timespec*);
@@ -67,3 +68,4 @@ extern "C" __attribute__((visibility("default"))) int gettimeofday(timeval* out,
     out->tv_usec = now.tv_nsec / 1000;
     return 0;
 }
+// NOLINTEND(readability-inconsistent-declaration-parameter-name)

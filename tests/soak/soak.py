@@ -125,6 +125,8 @@ class Soak:
         return {name: look(name) for name in self.editor.names}
 
     def check(self, done):
+        # What applications came and went is known from here on, so no later anchor may expire of that.
+        self.service.client().request("POST", "/v1/refresh")
         self.follow(done)
         if self.replica.anchor is None:
             self.replica.fill()
@@ -204,6 +206,8 @@ def main(programs, home, seed, minutes, image):
             plot.write(image, f"{soak.now() / 60:.0f} minutes of everything at once", soak.sampler.samples,
                        soak.starts)
     print(result, flush=True)
+    if soak.service.is_alive():
+        soak.service.kill()
     os._exit(0 if result.startswith("1") else 1)  # threads may hang in what failed
 
 
