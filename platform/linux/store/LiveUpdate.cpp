@@ -111,7 +111,9 @@ void LiveUpdate::processFolder(const std::vector<HintSet::Hint>& hints, std::siz
         left_.rootMoved = left_.rootMoved || (hint.what & WatchHint::rootMoved) != 0;
         if (!opened) {
             // It is in no served tree any more; what comes of it is somebody else's.
-            scope_.watches.unwatch(hint.folder);
+            if (!scope_.roots.isParent(hint.folder)) {
+                scope_.watches.unwatch(hint.folder);
+            }
         } else if (!*opened) {
             left_.hints.push_back(hint);
         } else {

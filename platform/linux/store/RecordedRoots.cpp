@@ -101,6 +101,13 @@ std::optional<std::string> RecordedRoots::storedPath(std::string_view absolutePa
     return std::nullopt;
 }
 
+bool RecordedRoots::isParent(FileID folder) const {
+    const MutexLock lock(mutex_);
+    return std::ranges::any_of(libraries_, [folder](const FolderPointer& library) {
+        return library->parent == folder && folder != FileID{};
+    });
+}
+
 RecordedRoots::FolderPointer RecordedRoots::folderAt(const EntryStatus& status) const {
     if (root_->isAt(status)) {
         return root_;

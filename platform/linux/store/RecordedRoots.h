@@ -28,6 +28,7 @@ class RecordedRoots {
         UniqueFD open;  // none: it can't be recorded now, and `problem` says why
         DeviceID device{};
         FileID file{};
+        FileID parent{};  // of a library: the folder it is in, of which its removal is told
         std::optional<Error> problem;
 
         [[nodiscard]] std::string storedPath() const { return key.empty() ? key : "/" + key; }
@@ -66,6 +67,8 @@ class RecordedRoots {
     // No value for what lies in none of the trees that are open.
     [[nodiscard]] std::optional<std::string> storedPath(std::string_view absolutePath) const
         MARROWDALE_EXCLUDES(mutex_);
+    // Whether a library is, or was, in that folder.
+    [[nodiscard]] bool isParent(FileID folder) const MARROWDALE_EXCLUDES(mutex_);
     // The open root or library that this is; null for anything else.
     [[nodiscard]] FolderPointer folderAt(const EntryStatus& status) const
         MARROWDALE_EXCLUDES(mutex_);

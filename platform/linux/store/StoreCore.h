@@ -166,6 +166,7 @@ class Store::Core {
     [[nodiscard]] Expected<EntryLook> openLibrary(
         RecordedRoots::Folder& folder,
         const std::vector<RecordedRoots::FolderPointer>& others) const;
+    void watchParent(int library, RecordedRoots::Folder& folder) const;
     void placeLibrary(const RecordedRoots::Folder& folder, const EntryLook& look, Bound& news)
         MARROWDALE_EXCLUDES(mutex_);
     void noteLibraryProblem(const RecordedRoots::Folder& folder,

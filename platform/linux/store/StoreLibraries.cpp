@@ -141,9 +141,23 @@ RecordedRoots::FolderPointer Store::Core::bound(
         placeLibrary(*folder, *look, news);
     } else {
         folder->problem = look.error();
+        folder->parent = before != nullptr ? before->parent : FileID{};
         noteLibraryProblem(*folder, before);
     }
     return folder;
+}
+
+// A library that is removed while it is held open tells so too late, when it is let go of. Where
+// its parent can't be watched, whoever knows the libraries tells, as of those that are new.
+void Store::Core::watchParent(int library, RecordedRoots::Folder& folder) const {
+    const UniqueFD parent(::openat(library, "..", O_PATH | O_DIRECTORY | O_CLOEXEC));
+    const auto status = parent ? statEntry(parent.get(), "") : Unexpected(Error{});
+    const auto unindexed = unindexedFolders();
+    if (watcher_ && status && status->device == device_ &&
+        std::ranges::find(unindexed, status->fileID) == unindexed.end() &&
+        watcher_->watchFolder(parent.get(), status->fileID)) {
+        folder.parent = status->fileID;
+    }
 }
 
 Expected<EntryLook> Store::Core::openLibrary(
@@ -164,6 +178,7 @@ Expected<EntryLook> Store::Core::openLibrary(
     if (status->device != device_) {
         return refusal(EXDEV);
     }
+    watchParent(opened->get(), folder);  // and then see whether it still is where it was
     if (canonicalPath(folder.path).value_or(std::string()) != folder.path) {
         return refusal(ELOOP);
     }
