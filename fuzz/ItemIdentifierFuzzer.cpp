@@ -29,6 +29,10 @@ class EveryDocument : public marrowdale::GenerationStore {
         const marrowdale::URL& /*url*/, marrowdale::AllocateIfNone /*allocateIfNone*/) override {
         return marrowdale::DocumentID{1};
     }
+    marrowdale::Expected<void> allocatePermanentStorage(
+        std::span<const std::string> /*paths*/) override {
+        return {};
+    }
 };
 
 }  // namespace

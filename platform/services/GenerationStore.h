@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstdint>
+#include <span>
+#include <string>
 
 #include "platform/foundation/Error.h"
 #include "platform/foundation/Identifiers.h"
@@ -30,6 +32,12 @@ class GenerationStore {
     // stands there now, whatever it answers.
     [[nodiscard]] virtual Expected<DocumentID> permanentStorageForItemAtURL(
         const URL& url, AllocateIfNone allocateIfNone) = 0;
+
+    // Gives a document to each entry at the paths that has none, all of them durable with one sync:
+    // for whoever is about to ask for each of them. Folders, and what can't be looked at, are left
+    // out without an error.
+    [[nodiscard]] virtual Expected<void> allocatePermanentStorage(
+        std::span<const std::string> paths) = 0;
 };
 
 }  // namespace marrowdale

@@ -36,6 +36,7 @@ class FakeDocumentIndex final : public DocumentIndex {
         for (Request& request : requests) {
             const auto next = DocumentID{static_cast<std::uint32_t>(documents_.size() + 1)};
             request.document = documents_.try_emplace(keyOf(request.status), next).first->second;
+            request.isThere = request.name != goneName_;
             if (recording_) {
                 told_.push_back({request.folder, std::string(request.folderPath),
                                  std::string(request.name), request.status, request.document});
@@ -69,6 +70,11 @@ class FakeDocumentIndex final : public DocumentIndex {
     void failWith(std::optional<Error> failure) {
         const std::lock_guard lock(mutex_);
         failure_ = std::move(failure);
+    }
+    // An entry of that name is gone by the time it is asked for.
+    void setGone(std::string name) {
+        const std::lock_guard lock(mutex_);
+        goneName_ = std::move(name);
     }
     void setPath(DeviceID device, FileID file, std::string path) {
         const std::lock_guard lock(mutex_);
@@ -106,6 +112,7 @@ class FakeDocumentIndex final : public DocumentIndex {
     std::map<FileID, std::uint32_t> subfolders_;
     std::optional<Error> failure_;
     std::vector<Told> told_;
+    std::string goneName_;
     int assignCalls_ = 0;
     bool recording_ = true;
 };

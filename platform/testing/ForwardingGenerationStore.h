@@ -19,6 +19,9 @@ class ForwardingGenerationStore : public GenerationStore {
                                                       AllocateIfNone allocateIfNone) override {
         return target_.permanentStorageForItemAtURL(url, allocateIfNone);
     }
+    Expected<void> allocatePermanentStorage(std::span<const std::string> paths) override {
+        return target_.allocatePermanentStorage(paths);
+    }
 
   private:
     GenerationStore& target_;

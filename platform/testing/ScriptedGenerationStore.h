@@ -33,6 +33,10 @@ class ScriptedGenerationStore : public GenerationStore {
         lookUps_.push_back({url.path(), allocateIfNone});
         return next(allocations);
     }
+    // Does nothing.
+    Expected<void> allocatePermanentStorage(std::span<const std::string> /*paths*/) override {
+        return {};
+    }
     struct LookUp {
         std::string path;
         AllocateIfNone allocateIfNone;

@@ -23,6 +23,10 @@ class DocumentIndex {
         std::string_view name;
         EntryStatus status;
         DocumentID document{};  // the answer
+        // Answered too: false where the entry is not there any more. It has a document all the
+        // same, for it may stand elsewhere by now; but nobody may ever tell that it is gone from
+        // here, if it went before the index knew of it.
+        bool isThere = true;
     };
 
     // Fills in the document identifier of every entry, gives one to those that have none, and

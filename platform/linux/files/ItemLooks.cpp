@@ -156,7 +156,7 @@ void ItemLooks::assignDocumentIDs() {
         return;
     }
     std::vector<DocumentIndex::Request> requests;
-    std::vector<PrefetchedValues*> requested;
+    std::vector<Item*> requested;
     for (const Group& group : groups_) {
         for (Item& item : group.items) {
             if (group.failure || item.dropped || !hasDocumentIdentifier(item.values)) {
@@ -166,7 +166,7 @@ void ItemLooks::assignDocumentIDs() {
             if (group.folderURL) {
                 requests.push_back(
                     {group.folder, group.folderURL->path(), item.name, item.status, {}});
-                requested.push_back(&item.values);
+                requested.push_back(&item);
             }
         }
     }
@@ -174,8 +174,9 @@ void ItemLooks::assignDocumentIDs() {
         return;
     }
     for (std::size_t i = 0; i < requests.size(); ++i) {
-        requested[i]->known.insert(ResourceKey::documentIdentifier);
-        requested[i]->documentIdentifier = requests[i].document;
+        requested[i]->dropped = !requests[i].isThere;
+        requested[i]->values.known.insert(ResourceKey::documentIdentifier);
+        requested[i]->values.documentIdentifier = requests[i].document;
     }
 }
 

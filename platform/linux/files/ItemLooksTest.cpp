@@ -167,6 +167,15 @@ TEST_P(ItemLooksTest, whatIsNotThereIsMissing) {
     }
 }
 
+// Whoever is told of it would never hear that it is gone, if nobody knew of it before.
+TEST_P(ItemLooksTest, whatWentBeforeItHadADocumentIsMissing) {
+    writeFile(world_.at("a"), "");
+    writeFile(world_.at("b"), "");
+    world_.documents.setGone("a");
+    expectMissing(lookAt("a"), world_.at("a"));
+    EXPECT_TRUE(lookAt("b"));
+}
+
 TEST_P(ItemLooksTest, whatCannotBeLookedAtIsAnotherError) {
     if (runsAsRoot()) {
         MARROWDALE_SKIP_FOR_USER("permissions don't bind root");

@@ -46,6 +46,10 @@ Expected<DocumentID> Store::permanentStorageForItemAtURL(const URL& url,
     return core_->documentAt(url.path(), allocateIfNone);
 }
 
+Expected<void> Store::allocatePermanentStorage(std::span<const std::string> paths) {
+    return core_->allocateAt(paths);
+}
+
 Expected<EventID> Store::barrier() {
     return core_->barrier();
 }

@@ -76,6 +76,8 @@ class Store final : public GenerationStore, public EventHistory, public Document
     // committed with what comes next.
     [[nodiscard]] Expected<DocumentID> permanentStorageForItemAtURL(
         const URL& url, AllocateIfNone allocateIfNone) override;
+    [[nodiscard]] Expected<void> allocatePermanentStorage(
+        std::span<const std::string> paths) override;
 
     // EventHistory.
     [[nodiscard]] Expected<EventID> barrier() override;

@@ -107,6 +107,7 @@ Expected<bool> Store::Core::fillKnown(std::span<Request> requests,
             guess = noRow;
         }
         request.document = {};
+        request.isThere = true;
         // The folder that a root lies in has no row.
         RowNumber row = rootRowOf(request);
         foldersKnown = foldersKnown && (row != noRow || parent != noRow);
@@ -261,6 +262,7 @@ Expected<void> Store::Core::giveOut(std::span<Request> requests, std::span<const
         }
         // A reconcile may have run since the entry was looked up.
         RowNumber row = wasLookedAt ? rowOfLook(request, *look) : rowOf(request);
+        request.isThere = wasLookedAt ? look->stands : row != noRow;
         if (row == noRow) {
             row = rowOfLook(request, {i, {request.status, 0, Date::now()}, false});
         }

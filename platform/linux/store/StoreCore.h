@@ -52,6 +52,8 @@ class Store::Core {
     [[nodiscard]] Expected<DocumentID> documentAt(const std::string& path,
                                                   AllocateIfNone allocateIfNone)
         MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<void> allocateAt(std::span<const std::string> paths)
+        MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<EventID> barrier() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] EventID lastEventID() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] EventHistory::Standing standingOf(EventID since) MARROWDALE_EXCLUDES(mutex_);

@@ -68,6 +68,21 @@ Expected<DocumentID> Store::Core::documentAt(const std::string& path,
     return request->document;
 }
 
+Expected<void> Store::Core::allocateAt(std::span<const std::string> paths) {
+    std::vector<Request> requests;
+    for (const std::string& path : paths) {
+        const auto status = statEntry(AT_FDCWD, path.c_str());
+        if (!status || status->isDirectory() || status->isMountPoint ||
+            knownDocumentID(*status) != DocumentID{}) {
+            continue;
+        }
+        if (auto request = requestFor(path, *status)) {
+            requests.push_back(*request);
+        }
+    }
+    return requests.empty() ? Expected<void>() : assignDocumentIDs(requests);
+}
+
 // A look is merged only where the entry is not known as it stands: a document whose file is the one
 // that stands there is noted already.
 Expected<DocumentID> Store::Core::lookUpDocument(Request& request) {

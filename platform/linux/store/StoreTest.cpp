@@ -260,8 +260,10 @@ TEST_P(StoreTest, AnEntryGoneBetweenListingAndAskingHasADocumentThatIsGone) {
     open();
     write("a");
     auto requests = requestsFor("");
+    EXPECT_TRUE(requests.requests.front().isThere);
     remove("a");
     const auto given = assign(requests);
+    EXPECT_FALSE(requests.requests.front().isThere);
     EXPECT_EQ(store().resolveDocumentID(given.at("a"), device()).error().code, ENOENT);
     reopen();
     EXPECT_EQ(store().resolveDocumentID(given.at("a"), device()).error().code, ENOENT);

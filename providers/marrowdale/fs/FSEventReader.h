@@ -13,7 +13,6 @@
 
 #include "platform/Platform.h"
 #include "platform/foundation/Mutex.h"
-#include "providers/marrowdale/fs/FSEventLooks.h"
 #include "providers/marrowdale/fs/FSEventReaderDelegate.h"
 #include "providers/marrowdale/fs/FSEventReaderGatherPhaseResumeStatus.h"
 
@@ -27,8 +26,8 @@ enum class FSEventReaderMode : std::uint8_t {
 // Reads one stream of events and tells its delegate what they mean for the items in the monitored
 // folders: this one changed, that one is gone, the history ends here, start over.
 //
-// An event is a hint. What stands at its path is looked at when its batch has come, and the item is
-// made from that. An event that says that a file is gone is told as the file's deletion when
+// An event is a hint. What stands at its path is looked at when the event is handled, and the item
+// is made from that. An event that says that a file is gone is told as the file's deletion when
 // nothing, or another file, stands at the path by now; where the same file stands there again it is
 // a change, and where that file is another document now, the earlier one is told as deleted:
 // numbers of files are given out again. A path is hidden when a component of it below the monitored
@@ -124,17 +123,17 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
     // What happens to events: FSEventReaderEvents.cpp. Each handler answers whether the event was
     // handled to its end; false when the reader was stopped before that.
     void handleBatch(const Run& run, std::span<const FileEvent> events);
-    [[nodiscard]] FSEventLooks looksAt(std::span<const FileEvent> events) const;
+    void allocateDocuments(std::span<const FileEvent> events) const;
     void countAsProcessed(EventID eventID);
     [[nodiscard]] bool handle(const Run& run, FSEventReaderDelegate& delegate,
-                              const FileEvent& event, const FSEventLooks& looks) const;
+                              const FileEvent& event) const;
     [[nodiscard]] bool handlePath(const Run& run, FSEventReaderDelegate& delegate,
-                                  const FileEvent& event, const FSEventLooks& looks) const;
+                                  const FileEvent& event) const;
     [[nodiscard]] bool handleDocumentPath(const Run& run, FSEventReaderDelegate& delegate,
-                                          const FileEvent& event, const FSEventLooks& looks) const;
+                                          const FileEvent& event) const;
     [[nodiscard]] bool handleURL(const Run& run, FSEventReaderDelegate& delegate,
-                                 const FileEvent& event, const URL& url, Comparison comparison,
-                                 const FSEventLooks& looks) const;
+                                 const FileEvent& event, const URL& url,
+                                 Comparison comparison) const;
     [[nodiscard]] bool handleItem(const Run& run, FSEventReaderDelegate& delegate,
                                   const FileEvent& event, const URL& url,
                                   std::optional<FileID> otherFile) const;

@@ -6,6 +6,7 @@
 #include "providers/marrowdale/fs/FSEventDescription.h"
 #include "providers/marrowdale/fs/FSEventReader.h"
 #include "providers/marrowdale/items/FileSystemAccess.h"
+#include "providers/marrowdale/items/ItemLook.h"
 #include "providers/marrowdale/items/MRFileObjectIdentifier.h"
 #include "providers/marrowdale/items/MRWFileObjectIdentifier.h"
 
@@ -13,9 +14,6 @@ namespace marrowdale {
 
 namespace {
 
-// As many events are looked at together as an answer to a host has changes, and none that a
-// delegate which stops there will not be told of.
-constexpr std::size_t lookAhead = 200;
 constexpr std::string_view documentPathMark = ".docid/";
 constexpr std::string_view documentPathFormat = "/.docid/$dev/changed/$docid/src=$src,dst=$dst";
 
@@ -42,6 +40,36 @@ bool isHiddenBelow(const URL& root, const URL& url) {
     return url.path().find("/.", begin) != std::string::npos;
 }
 
+// What stands at a place: the entry itself, where it is a link too.
+struct Entry {
+    URL url;  // with all that the item is made of, of one look
+    bool exists = false;
+    std::optional<FileID> fileID = std::nullopt;  // unless it can't be told
+};
+
+bool isMissing(const Error& error) {
+    return error.domain == ErrorDomain::file &&
+           error.code == static_cast<int>(FileErrorCode::noSuchFile);
+}
+
+// Looked at when the event's turn comes: what is told of a place must not be older than what the
+// events behind it say of it.
+Entry entryAt(const Platform& platform, const URL& url) {
+    const auto look = std::move(looksAt(platform, std::span(&url, 1)).front());
+    if (!look) {
+        return {.url = url, .exists = !isMissing(look.error())};
+    }
+    const auto value = platform.fileSystem.resourceValue(*look, ResourceKey::fileID);
+    if (!value) {
+        return {.url = *look, .exists = !isMissing(value.error())};
+    }
+    const auto* number = std::get_if<Number>(&*value);
+    const auto fileID = number ? unsignedValue(*number) : std::nullopt;
+    return {.url = *look,
+            .exists = true,
+            .fileID = fileID ? std::optional(FileID{*fileID}) : std::nullopt};
+}
+
 std::shared_ptr<LocalItem> makeItem(const Platform& platform, const URL& url) {
     return LocalItem::initWithURL(platform, url,
                                   {.customItemID = {},
@@ -55,22 +83,20 @@ std::shared_ptr<LocalItem> makeItem(const Platform& platform, const URL& url) {
 
 void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> events) {
     logDecision([&] { return "fsevent: received " + std::to_string(events.size()) + " events"; });
-    std::optional<FSEventLooks> looks;
-    for (std::size_t i = 0; i < events.size(); ++i) {
-        const FileEvent& event = events[i];
+    if (delegate_.lock() && !run.isStopped) {
+        allocateDocuments(events);
+    }
+    for (const FileEvent& event : events) {
         const auto delegate = delegate_.lock();
         if (!delegate || run.isStopped) {
             return;
-        }
-        if (i % lookAhead == 0) {
-            looks.emplace(looksAt(events.subspan(i, std::min(lookAhead, events.size() - i))));
         }
         std::optional<LogSection> section;
         if (verbose_) {
             section.emplace(platform_.log,
                             [&] { return " fsevents: " + marrowdale::description(event); });
         }
-        if (!handle(run, *delegate, event, *looks)) {
+        if (!handle(run, *delegate, event)) {
             return;
         }
         if (!says(event, FileEventFlag::eventIDsWrapped)) {
@@ -79,23 +105,21 @@ void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> event
     }
 }
 
-// What stands at the events' places, looked at together: folders are opened once each, and document
-// identifiers are given out with one sync of the disk.
-FSEventLooks FSEventReader::looksAt(std::span<const FileEvent> events) const {
-    std::vector<URL> places;
-    places.reserve(events.size());
+// All at once, because each would cost a sync of the disk. What fails here fails, and is told,
+// where the item is made.
+void FSEventReader::allocateDocuments(std::span<const FileEvent> events) const {
+    std::vector<std::string> paths;
     for (const FileEvent& event : events) {
-        const bool hasPlace =
-            event.path && !event.path->empty() && !says(event, FileEventFlag::documentMoved);
-        if (!hasPlace) {
-            continue;
-        }
-        // Made anew, so that nothing that was cached for the path is taken for what is there now.
-        if (URL place = URL::fileURL(*event.path); placeOf(place) == Place::visible) {
-            places.push_back(std::move(place));
+        const bool isOfFile = event.path && !event.path->empty() &&
+                              !says(event, FileEventFlag::gone | FileEventFlag::isFolder |
+                                               FileEventFlag::documentMoved);
+        if (isOfFile && placeOf(URL::fileURL(*event.path)) == Place::visible) {
+            paths.push_back(*event.path);
         }
     }
-    return {platform_, places};
+    if (paths.size() > 1) {
+        (void)platform_.generationStore.allocatePermanentStorage(paths);
+    }
 }
 
 // Runs of the reader follow each other on one queue, so no two of these meet.
@@ -105,8 +129,8 @@ void FSEventReader::countAsProcessed(EventID eventID) {
     }
 }
 
-bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate, const FileEvent& event,
-                           const FSEventLooks& looks) const {
+bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate,
+                           const FileEvent& event) const {
     if (says(event, FileEventFlag::eventIDsWrapped)) {
         if (verbose_) {
             platform_.log.info([] { return "fsevents id wrapped"; });
@@ -129,25 +153,27 @@ bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate, cons
     if (concernsTheStream && !event.path) {
         return true;
     }
-    return !run.isStopped && handlePath(run, delegate, event, looks);
+    return !run.isStopped && handlePath(run, delegate, event);
 }
 
 bool FSEventReader::handlePath(const Run& run, FSEventReaderDelegate& delegate,
-                               const FileEvent& event, const FSEventLooks& looks) const {
+                               const FileEvent& event) const {
     if (!event.path || event.path->empty()) {
         platform_.log.error("ignore event " + marrowdale::description(event) +
                             " because no path can be extracted");
         return true;
     }
     if (mode_ == FSEventReaderMode::docIDBased && event.path->contains(documentPathMark)) {
-        return handleDocumentPath(run, delegate, event, looks);
+        return handleDocumentPath(run, delegate, event);
     }
-    return handleURL(run, delegate, event, URL::fileURL(*event.path), Comparison::withTheEventsFile,
-                     looks);
+    // Made anew for each event, so that nothing that was cached for the path is taken for what is
+    // there now.
+    return handleURL(run, delegate, event, URL::fileURL(*event.path),
+                     Comparison::withTheEventsFile);
 }
 
 bool FSEventReader::handleDocumentPath(const Run& run, FSEventReaderDelegate& delegate,
-                                       const FileEvent& event, const FSEventLooks& looks) const {
+                                       const FileEvent& event) const {
     DocIDChange change;
     if (!parseDocIDChangePath(*event.path, change)) {
         platform_.log.error("can't parse docID path " + quoted(*event.path) +
@@ -166,7 +192,7 @@ bool FSEventReader::handleDocumentPath(const Run& run, FSEventReaderDelegate& de
             [&] { return "dropping fsevent at " + url->path() + "; URL is not monitored"; });
         return tellOutOfSight(run, delegate, event, *url);
     }
-    return handleURL(run, delegate, event, *url, Comparison::none, looks);
+    return handleURL(run, delegate, event, *url, Comparison::none);
 }
 
 // What a package holds is no item, though its documents keep their identifiers.
@@ -186,8 +212,7 @@ bool FSEventReader::isInPackage(const URL& url) const {
 }
 
 bool FSEventReader::handleURL(const Run& run, FSEventReaderDelegate& delegate,
-                              const FileEvent& event, const URL& url, Comparison comparison,
-                              const FSEventLooks& looks) const {
+                              const FileEvent& event, const URL& url, Comparison comparison) const {
     switch (placeOf(url)) {
         case Place::hidden:
             logDecision([&] { return "dropping fsevent at " + url.path() + "; URL is hidden"; });
@@ -199,7 +224,7 @@ bool FSEventReader::handleURL(const Run& run, FSEventReaderDelegate& delegate,
         case Place::visible:
             break;
     }
-    const FSEventLooks::Entry entry = looks.entryAt(url);
+    const Entry entry = entryAt(platform_, url);
     if (!entry.exists) {
         return tellDeletions(run, delegate, event, url);
     }

@@ -47,42 +47,8 @@ TEST_P(FSEventReaderEventsTest, anItemIsMadeAnewForEachEvent) {
     EXPECT_EQ(delegate_->items[1]->documentSize, 2U);
 }
 
-// Counts the looks, and how many items each was for.
-class LookCounter : public ForwardingFileSystem {
-  public:
-    using ForwardingFileSystem::ForwardingFileSystem;
-    std::vector<std::size_t> looks;
-
-    std::vector<Expected<URL>> lookAt(std::span<const URL> urls,
-                                      const LookRequest& request) override {
-        looks.push_back(urls.size());
-        return ForwardingFileSystem::lookAt(urls, request);
-    }
-};
-
-TEST_P(FSEventReaderEventsTest, theItemsOfABatchAreLookedAtTogether) {
-    reader_->stop();
-    LookCounter counter(world_.fileSystem);
-    const Platform platform = withFileSystem(platform_, counter);
-    reader_ = FSEventReader::make(platform, options());
-    reader_->start();
-    for (const char* name : {"f/a", "f/b", "g/c"}) {
-        makeFolder(world_.path(std::string_view(name).substr(0, 1)));
-        writeFile(world_.path(name), name);
-    }
-    tell({event("f/a", FileEventFlag::changed), event("g/c", FileEventFlag::appeared),
-          gone("f/none", FileID{5}), event(".hidden", FileEventFlag::changed),
-          event("f/b", FileEventFlag::changed), event("f/a", FileEventFlag::changed)});
-    EXPECT_EQ(delegate_->told,
-              (Lines{"change a 11", "change c 12", "delete fid=5 " + world_.path("f/none") + " 13",
-                     "change b 15", "change a 16"}));
-    EXPECT_EQ(counter.looks, std::vector<std::size_t>{5});
-    reader_->stop();
-    reader_.reset();
-}
-
 // Both ways to read it must fail before an item that stands there is left out.
-TEST_P(FSEventReaderEventsTest, whatTheLookOfABatchFailsForIsAskedForAlone) {
+TEST_P(FSEventReaderEventsTest, whatALookFailsForIsAskedForValueByValue) {
     writeFile(world_.path("a"), "1");
     world_.fileSystem.lookFault = [&](const URL& url) {
         return url == world_.url("a") ? std::optional(errorWithPOSIXCode(EIO)) : std::nullopt;
