@@ -52,6 +52,8 @@ class Soak:
         return time.monotonic() - self.begun
 
     def wait(self, seconds):
+        """How long the load or a trouble goes on; no check waits by it: pictures
+        are compared when everybody pauses, and a client asks until nothing more comes."""
         time.sleep(seconds)
 
     def run(self):

@@ -3,7 +3,6 @@
 import errno
 import os
 import signal
-import time
 
 
 def kill(soak):
@@ -94,7 +93,7 @@ def permissions(soak):
 def silence(soak):
     """Stopped for a while, as a machine that sleeps."""
     soak.service.process.send_signal(signal.SIGSTOP)
-    time.sleep(soak.random.random() * 3)
+    soak.wait(soak.random.random() * 3)
     soak.service.process.send_signal(signal.SIGCONT)
 
 
