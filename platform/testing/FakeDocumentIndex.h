@@ -45,6 +45,17 @@ class FakeDocumentIndex final : public DocumentIndex {
         return {};
     }
 
+    [[nodiscard]] Expected<void> confirmFolders(std::span<Request> requests) override {
+        const std::lock_guard lock(mutex_);
+        if (failure_) {
+            return Unexpected(*failure_);
+        }
+        for (Request& request : requests) {
+            request.isThere = request.name != goneName_;
+        }
+        return {};
+    }
+
     [[nodiscard]] DocumentID knownDocumentID(const EntryStatus& status) override {
         const std::lock_guard lock(mutex_);
         const auto known = documents_.find(keyOf(status));

@@ -34,6 +34,10 @@ class DocumentIndex {
     // (the store can't be written: ENOSPC, EIO, …) no identifier may be handed out.
     [[nodiscard]] virtual Expected<void> assignDocumentIDs(std::span<Request> requests) = 0;
 
+    // Answers which of these folders are there. Those that are, the index knows: whoever is told of
+    // one of them will be told when it goes. What the index never holds is there, as it was seen.
+    [[nodiscard]] virtual Expected<void> confirmFolders(std::span<Request> requests) = 0;
+
     // The document identifier that a file already has; 0 when none.
     [[nodiscard]] virtual DocumentID knownDocumentID(const EntryStatus& status) = 0;
 

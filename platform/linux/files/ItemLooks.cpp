@@ -41,7 +41,10 @@ std::vector<Expected<URL>> ItemLooks::lookAt(std::span<const URL> urls) {
     sort(urls);
     locateGroups();
     lookInGroups();
-    assignDocumentIDs();
+    if (wantsDocumentIDs_) {
+        confirmFolders();
+        assignDocumentIDs();
+    }
     std::vector<Expected<URL>> answers;
     answers.reserve(urls.size());
     for (const URL& url : urls) {
@@ -150,11 +153,31 @@ void ItemLooks::findFolder(Group& group, int descriptor) const {
                          describeEntry(*status, plain.lastPathComponent(), folderKeys, sources_));
 }
 
-// Where they can't be had, whoever asks for one gets the reason.
-void ItemLooks::assignDocumentIDs() {
-    if (!wantsDocumentIDs_) {
+// A folder that went before the index knew of it is not there: nobody would ever tell that it is
+// gone. Where the index fails, whoever follows it is told to begin anew.
+void ItemLooks::confirmFolders() {
+    std::vector<DocumentIndex::Request> requests;
+    std::vector<Item*> requested;
+    for (const Group& group : groups_) {
+        for (Item& item : group.items) {
+            if (!group.failure && !item.dropped && group.folderURL &&
+                !hasDocumentIdentifier(item.values)) {
+                requests.push_back(
+                    {group.folder, group.folderURL->path(), item.name, item.status, {}});
+                requested.push_back(&item);
+            }
+        }
+    }
+    if (requests.empty() || !sources_.documents.confirmFolders(requests)) {
         return;
     }
+    for (std::size_t i = 0; i < requests.size(); ++i) {
+        requested[i]->dropped = !requests[i].isThere;
+    }
+}
+
+// Where they can't be had, whoever asks for one gets the reason.
+void ItemLooks::assignDocumentIDs() {
     std::vector<DocumentIndex::Request> requests;
     std::vector<Item*> requested;
     for (const Group& group : groups_) {

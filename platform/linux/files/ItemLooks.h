@@ -42,6 +42,7 @@ class ItemLooks {
     void lookInGroups();
     void lookIn(Group& group, EntryLooks::Threads threads) const;
     void findFolder(Group& group, int descriptor) const;
+    void confirmFolders();
     void assignDocumentIDs();
     [[nodiscard]] static Expected<URL> answerFor(Item& item, const Group& group);
 

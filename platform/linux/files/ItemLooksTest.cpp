@@ -176,6 +176,14 @@ TEST_P(ItemLooksTest, whatWentBeforeItHadADocumentIsMissing) {
     EXPECT_TRUE(lookAt("b"));
 }
 
+TEST_P(ItemLooksTest, aFolderThatWentBeforeItWasKnownIsMissing) {
+    folder("a");
+    folder("b");
+    world_.documents.setGone("a");
+    expectMissing(lookAt("a"), world_.at("a"));
+    EXPECT_TRUE(lookAt("b"));
+}
+
 TEST_P(ItemLooksTest, whatCannotBeLookedAtIsAnotherError) {
     if (runsAsRoot()) {
         MARROWDALE_SKIP_FOR_USER("permissions don't bind root");

@@ -73,8 +73,14 @@ Expected<std::uint64_t> LinuxDirectoryEnumerator::next(std::uint64_t limit,
     if (const auto finished = finishFolder(); !finished) {
         return fail(finished.error());
     }
-    if (const auto assigned = assignDocumentIDs(); !assigned) {
-        return fail(assigned.error());
+    if (keys_.contains(ResourceKey::documentIdentifier)) {
+        auto known = confirmFolders();
+        if (known) {
+            known = assignDocumentIDs();
+        }
+        if (!known) {
+            return fail(known.error());
+        }
     }
     makeURLs(urls);
     return walked;
@@ -255,10 +261,29 @@ Expected<void> LinuxDirectoryEnumerator::dropUnserved(std::size_t first) {
     return goOn;
 }
 
-Expected<void> LinuxDirectoryEnumerator::assignDocumentIDs() {
-    if (!keys_.contains(ResourceKey::documentIdentifier)) {
-        return {};
+// A folder that went before the index knew of it is left out: nobody would ever tell that it is
+// gone. A file has a document by which that is told.
+Expected<void> LinuxDirectoryEnumerator::confirmFolders() {
+    std::vector<Pending*> requested;
+    for (Pending& pending : pending_) {
+        if (pending.status.isDirectory() &&
+            (pending.url || !hasDocumentIdentifier(pending.values))) {
+            const BatchFolder& folder = folders_[pending.folder];
+            requests_.push_back(
+                {folder.fileID, folder.url.path(), pending.name, pending.status, {}});
+            requested.push_back(&pending);
+        }
     }
+    auto confirmed =
+        requests_.empty() ? Expected<void>() : sources_.documents.confirmFolders(requests_);
+    for (std::size_t i = 0; confirmed && i < requested.size(); ++i) {
+        requested[i]->dropped = !requests_[i].isThere;
+    }
+    requests_.clear();
+    return confirmed;
+}
+
+Expected<void> LinuxDirectoryEnumerator::assignDocumentIDs() {
     for (const Pending& pending : pending_) {
         if (!pending.url && hasDocumentIdentifier(pending.values)) {
             const BatchFolder& folder = folders_[pending.folder];
@@ -286,9 +311,11 @@ void LinuxDirectoryEnumerator::makeURLs(std::vector<URL>& urls) {
         urls.reserve(pending_.size());
     }
     for (Pending& pending : pending_) {
-        urls.push_back(pending.url ? std::move(*pending.url)
-                                   : URL::listedChild(folders_[pending.folder].url, pending.name,
-                                                      std::move(pending.values)));
+        if (!pending.dropped) {
+            urls.push_back(pending.url ? std::move(*pending.url)
+                                       : URL::listedChild(folders_[pending.folder].url,
+                                                          pending.name, std::move(pending.values)));
+        }
     }
 }
 

@@ -62,6 +62,7 @@ class LinuxDirectoryEnumerator final : public DirectoryEnumerator {
     [[nodiscard]] std::string_view keepName(std::string_view name);
     [[nodiscard]] Expected<void> finishFolder();
     [[nodiscard]] Expected<void> dropUnserved(std::size_t first);
+    [[nodiscard]] Expected<void> confirmFolders();
     [[nodiscard]] Expected<void> assignDocumentIDs();
     void makeURLs(std::vector<URL>& urls);
     [[nodiscard]] Unexpected fail(Error error);

@@ -43,6 +43,22 @@ TEST_P(WalkChangesTest, entriesThatVanishAreCountedAndLeftOut) {
     EXPECT_TRUE(errors_.empty());
 }
 
+// Whoever is told of it would never hear that it is gone.
+TEST_P(WalkChangesTest, folderThatWentBeforeItWasKnownIsCountedAndLeftOut) {
+    folder("a");
+    folder("b");
+    file("c");
+    world_.documents.setGone("a");
+    for (const auto& options : {flat, deep}) {
+        std::vector<URL> urls;
+        EXPECT_EQ(*walk(request(options))->next(100, urls), 3U);
+        EXPECT_EQ(namesOf(urls), (Names{"b", "c"}));
+    }
+    world_.documents.failWith(errorWithPOSIXCode(EIO));
+    std::vector<URL> urls;
+    EXPECT_EQ(walk(request(flat))->next(100, urls).error().code, EIO);
+}
+
 TEST_P(WalkChangesTest, folderRemovedUnderTheWalkIsNoError) {
     folder("sub");
     for (int i = 0; i < 5; ++i) {

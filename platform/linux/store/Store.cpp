@@ -90,6 +90,10 @@ Expected<void> Store::assignDocumentIDs(std::span<Request> requests) {
     return core_->assignDocumentIDs(requests);
 }
 
+Expected<void> Store::confirmFolders(std::span<Request> requests) {
+    return core_->confirmFolders(requests);
+}
+
 DocumentID Store::knownDocumentID(const EntryStatus& status) {
     return core_->knownDocumentID(status);
 }

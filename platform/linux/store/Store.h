@@ -93,6 +93,7 @@ class Store final : public GenerationStore, public EventHistory, public Document
     // DocumentIndex. What lies in none of the trees, or in the state or cache folder, is ENOENT;
     // what lies behind a mount is ENXIO.
     [[nodiscard]] Expected<void> assignDocumentIDs(std::span<Request> requests) override;
+    [[nodiscard]] Expected<void> confirmFolders(std::span<Request> requests) override;
     [[nodiscard]] DocumentID knownDocumentID(const EntryStatus& status) override;
     [[nodiscard]] Expected<std::string> pathForFileID(DeviceID device, FileID file) override;
     [[nodiscard]] std::uint32_t subfolderCount(FileID folder) override;

@@ -70,6 +70,8 @@ class Store::Core {
     [[nodiscard]] Expected<UUID> volumeUUID(const URL& url) const;
     [[nodiscard]] Expected<void> assignDocumentIDs(std::span<Request> requests)
         MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] Expected<void> confirmFolders(std::span<Request> requests)
+        MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] DocumentID knownDocumentID(const EntryStatus& status) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<std::string> pathForFileID(DeviceID device, FileID file)
         MARROWDALE_EXCLUDES(mutex_);
@@ -195,6 +197,13 @@ class Store::Core {
     void addPlace(RowNumber number, std::vector<Place>& places) MARROWDALE_REQUIRES(mutex_);
     [[nodiscard]] Expected<std::optional<Place>> standing(std::vector<Place>& places) const;
     [[nodiscard]] Expected<EntryLook> lookAt(const Place& place) const;
+
+    // Confirming (StoreConfirm.cpp).
+    void dropKnown(std::span<const Request> requests, std::vector<std::size_t>& unknown)
+        MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] bool isKnownFolder(const Request& request) MARROWDALE_REQUIRES(mutex_);
+    void dropUnindexed(std::span<const Request> requests, std::vector<std::size_t>& unknown) const;
+    [[nodiscard]] bool stands(const Request& request) const;
 
     // Giving out.
     [[nodiscard]] Expected<bool> fillKnown(std::span<Request> requests,
