@@ -14,6 +14,7 @@ namespace marrowdale::tests {
 namespace {
 
 constexpr std::size_t keptLines = 8;
+constexpr std::string_view folderMark = "fid=";
 
 // 0 where nothing stands.
 std::uint64_t fileAt(const std::string& path) {
@@ -42,18 +43,21 @@ void Picture::setWithin(std::function<void()> within) {
     within_ = std::move(within);
 }
 
+// From what the item says, which may be older than what stands there by now. A link's own number is
+// not in it.
 Picture::Item Picture::itemOf(const LocalItem& item) {
     Item made;
     made.path = item.fileURL.path();
-    made.folder = fileAt(made.path.substr(0, made.path.rfind('/')));
-    struct stat status{};
-    if (::lstat(made.path.c_str(), &status) == 0) {
-        made.fileID = status.st_ino;
-        made.isFolder = S_ISDIR(status.st_mode) && item.isFolder();
-        if (S_ISREG(status.st_mode)) {
-            made.size = static_cast<std::uint64_t>(status.st_size);
-            made.modified = status.st_mtim.tv_sec * 1'000'000'000LL + status.st_mtim.tv_nsec;
-        }
+    made.isFolder = item.isFolder() && item.itemIdentifier.starts_with(folderMark);
+    const bool isLink = item.typeIdentifier == "inode/symlink";
+    made.fileID = isLink ? fileAt(made.path) : item.fileID.value_or(0);
+    made.folder = item.parentItemIdentifier.starts_with(folderMark)
+                      ? std::stoull(item.parentItemIdentifier.substr(folderMark.size()))
+                      : fileAt(made.path.substr(0, made.path.rfind('/')));
+    if (!isLink && item.documentSize) {
+        made.size = *item.documentSize;
+        const Date modified = item.contentModificationDate.value_or(Date());
+        made.modified = modified.seconds * 1'000'000'000LL + modified.nanoseconds;
     }
     return made;
 }
@@ -179,9 +183,7 @@ void Picture::fsEventReaderDidChangeItem(const std::shared_ptr<LocalItem>& item,
         const auto known = items_.find(identifier);
         Item now = itemOf(*item);
         if (event.fileID && now.fileID != raw(*event.fileID)) {
-            // The item is the event's file, which went after it was made.
-            now.fileID = raw(*event.fileID);
-            now.isFolder = item->isFolder() && identifier.starts_with("fid=");
+            now.fileID = raw(*event.fileID);  // of a link that is there no more
         }
         const bool moved =
             known != items_.end() && now.isFolder && known->second.front().path != now.path;

@@ -214,7 +214,7 @@ void LiveUpdate::merge(const Found& found) {
     tellArrival(*found.hint, found);
     const bool isNew = scope_.index.count() > count;
     if (scope_.index.row(row).isFolder()) {
-        if (isNew) {
+        if (isNew || scope_.index.row(row).has(Row::unlisted)) {
             toList_.push_back(row);
         } else if (found.digest && wasKnown) {
             merger_.noteFolderDigest(row, *found.digest);

@@ -371,6 +371,7 @@ void Reconciler::finishFolder(const Visit& visit, Outcome outcome) {
         return;
     }
     setUnreadable(visit.folder, outcome == Outcome::unreadable);
+    index_.row(visit.folder).set(Row::unlisted, false);
     if (outcome == Outcome::unreadable) {
         note(report_.unreadableFolders, report_.unreadableFolderCount, visit.path);
     } else {

@@ -36,11 +36,24 @@ Expected<void> Store::Core::assignDocumentIDs(std::span<Request> requests) {
         })) {
         return {};
     }
+    const Turn turn(*this);
     const auto looked = lookAtEntries(requests, unknown);
     if (!looked) {
         return Unexpected(looked.error());
     }
     return giveOut(requests, *looked);
+}
+
+Store::Core::Turn::Turn(Core& core) : core_(core) {
+    const MutexLock lock(core_.mutex_);
+    core_.waitUntilIdle();
+    core_.updating_ = true;
+}
+
+Store::Core::Turn::~Turn() {
+    const MutexLock lock(core_.mutex_);
+    core_.updating_ = false;
+    core_.idle_.notify_all();
 }
 
 RowNumber Store::Core::rootRowOf(const Request& request) {
@@ -189,6 +202,15 @@ RowNumber Store::Core::rowOf(const Request& request) {
 // What stands is put into the index at its name. What went meanwhile keeps the row it has, or gets
 // one without a place: if it was only moved, the next reconcile finds it and it keeps its document.
 RowNumber Store::Core::rowOfLook(const Request& request, const Looked& looked) {
+    const std::size_t count = index_.count();
+    const RowNumber row = mergeLook(request, looked);
+    if (row != noRow && index_.count() > count && index_.row(row).isFolder()) {
+        index_.row(row).set(Row::unlisted, true);
+    }
+    return row;
+}
+
+RowNumber Store::Core::mergeLook(const Request& request, const Looked& looked) {
     const RowNumber parent = folderRow(request.folder);
     if (looked.stands && parent != noRow) {
         EntryMerger merger(index_, changes_, saves_);
@@ -249,7 +271,6 @@ void Store::Core::takeBack(std::span<const RowNumber> given) {
 
 Expected<void> Store::Core::giveOut(std::span<Request> requests, std::span<const Looked> looked) {
     const MutexLock lock(mutex_);
-    waitUntilIdle();
     const std::uint32_t lastBefore = lastDocument_;
     std::vector<RowNumber> given;
     auto look = looked.begin();

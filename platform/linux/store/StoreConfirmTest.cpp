@@ -8,6 +8,7 @@ namespace {
 
 using testing::Contains;
 using testing::ElementsAre;
+using testing::IsSupersetOf;
 using testing::StartsWith;
 
 class StoreConfirmTest : public StoreEventsTest {
@@ -105,6 +106,31 @@ TEST_P(StoreConfirmTest, WhatIsInAFolderThatCannotBeListed) {
     begin();
     EXPECT_THAT(confirmed(seen), ElementsAre("inside"));
     std::filesystem::permissions(path("dark"), std::filesystem::perms::owner_all);
+}
+
+// A look-up takes note of the folder, and the recorder comes to it later.
+TEST_P(StoreConfirmTest, WhatIsInAFolderThatWasLookedUpFirst) {
+    begin();
+    makeFolder(path("folder/inner"));
+    makeFolder(path("moved"));
+    withStore([&] {
+        for (const char* folder : {"folder", "moved"}) {
+            EXPECT_EQ(
+                store()
+                    .permanentStorageForItemAtURL(URL::fileURL(path(folder)), AllocateIfNone::no)
+                    .error()
+                    .code,
+                ENOENT);
+        }
+    });
+    rename("moved", "elsewhere");
+    EXPECT_THAT(newsOnce(),
+                IsSupersetOf({"appeared folder/", "appeared folder/inner/", "renamed elsewhere/"}));
+    write("folder/file");
+    write("folder/inner/file");
+    write("elsewhere/file");
+    EXPECT_THAT(newsOnce(), IsSupersetOf({"appeared folder/file", "appeared folder/inner/file",
+                                          "appeared elsewhere/file"}));
 }
 
 INSTANTIATE_TEST_SUITE_P(OnEach, StoreConfirmTest,

@@ -126,6 +126,19 @@ class Store::Core {
         full,   // everything
     };
     void waitUntilIdle() MARROWDALE_REQUIRES(mutex_);
+    // While it lives no pass runs, so what its owner looks at is not older than what a pass saw: an
+    // older look would put the index back, and nothing would tell of it. Waits for the pass that
+    // runs.
+    class Turn {
+      public:
+        explicit Turn(Core& core) MARROWDALE_EXCLUDES(core.mutex_);
+        ~Turn();
+        Turn(const Turn&) = delete;
+        Turn& operator=(const Turn&) = delete;
+
+      private:
+        Core& core_;
+    };
     // A pass that began after the call serves the caller too.
     [[nodiscard]] Expected<void> runOnce(Pass pass) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<void> reconcileOnce() { return runOnce(Pass::full); }
@@ -227,6 +240,8 @@ class Store::Core {
                                                const EntryStatus& status) const;
     [[nodiscard]] Expected<DocumentID> lookUpDocument(Request& request) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] RowNumber rowOfLook(const Request& request, const Looked& looked)
+        MARROWDALE_REQUIRES(mutex_);
+    [[nodiscard]] RowNumber mergeLook(const Request& request, const Looked& looked)
         MARROWDALE_REQUIRES(mutex_);
     // The row's document; a new one, noted in `given`, where no name of the file has one. 0 when
     // there are none left.

@@ -99,12 +99,12 @@ Expected<DocumentID> Store::Core::lookUpDocument(Request& request) {
         return Unexpected(allowed.error());
     }
     if (!unknown.empty()) {
+        const Turn turn(*this);
         const auto looked = lookAtEntries(requests, unknown);
         if (!looked) {
             return Unexpected(looked.error());
         }
         const MutexLock lock(mutex_);
-        waitUntilIdle();
         const RowNumber row = rowOfLook(request, looked->front());
         request.document = DocumentID{row == noRow ? 0 : index_.row(row).document};
     }
