@@ -28,7 +28,8 @@ bool stands(const Picture::Item& item) {
 }
 
 std::string describe(const std::string& identifier, const Picture::Item& item) {
-    return identifier + " at " + item.path + ", file " + std::to_string(item.fileID);
+    return identifier + " at " + item.path + ", file " + std::to_string(item.fileID) + ", " +
+           std::to_string(item.size) + " bytes of " + std::to_string(item.modified);
 }
 
 }  // namespace
@@ -281,7 +282,7 @@ std::vector<std::string> Picture::differences() const {
                 explain("known at " + item.path, identifier, items.front());
             } else if (same->fileID != item.fileID || same->size != item.size ||
                        same->modified != item.modified) {
-                explain("changed and not told", identifier, *same);
+                explain("known as " + describe(identifier, item) + " and now", identifier, *same);
             }
         }
         for (const Item& item : items) {
