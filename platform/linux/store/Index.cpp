@@ -157,6 +157,7 @@ RowNumber Index::fill(RowNumber folder, std::string_view name, const Row& values
     fresh.name = nameOffset;
     if (fresh.isFolder()) {
         fresh.size = 0;
+        fresh.set(Row::unlisted, true);
     }
     ++count_;
     insertFile(number);

@@ -98,6 +98,7 @@ bool Index::linkRestored() {
         entry.flags &= Row::lastingFlags;
         if (entry.isFolder()) {
             entry.size = 0;
+            entry.set(Row::unlisted, true);
         }
     }
     for (RowNumber number = endOfRows_ - 1; number >= rootRow; --number) {

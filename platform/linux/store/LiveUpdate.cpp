@@ -201,7 +201,6 @@ void LiveUpdate::merge(const Found& found) {
     const RowNumber before = scope_.index.child(folder, found.hint->name);
     const bool wasKnown =
         before != noRow && EntryMerger::isSameFile(scope_.index.row(before), found.look, true);
-    const std::size_t count = scope_.index.count();
     const RowNumber row = merger_.merge(folder, found.hint->name, found.look);
     if (row == noRow) {
         left_.hints.push_back(*found.hint);  // folders are being moved about
@@ -212,9 +211,8 @@ void LiveUpdate::merge(const Found& found) {
         scope_.changes.returned(row);
     }
     tellArrival(*found.hint, found);
-    const bool isNew = scope_.index.count() > count;
     if (scope_.index.row(row).isFolder()) {
-        if (isNew || scope_.index.row(row).has(Row::unlisted)) {
+        if (scope_.index.row(row).has(Row::unlisted)) {
             toList_.push_back(row);
         } else if (found.digest && wasKnown) {
             merger_.noteFolderDigest(row, *found.digest);

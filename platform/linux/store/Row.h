@@ -28,8 +28,7 @@ struct alignas(64) Row {
     // Those that are kept on disk; the rest lives for one reconcile or one commit.
     static constexpr std::uint32_t lastingFlags = 0x00FFFF7FU;
     static constexpr std::uint32_t seen = 1U << 24U;      // met by the reconcile that is running
-    // A folder that somebody asked for before the recorder came to it: what is in it was never
-    // listed, nor is it watched.
+    // A folder that was not listed since it is known or the index was loaded, so not watched.
     static constexpr std::uint32_t unlisted = 1U << 25U;
     static constexpr std::uint32_t visiting = 1U << 26U;  // being listed
     static constexpr std::uint32_t dirty = 1U << 27U;     // differs from the log

@@ -202,15 +202,6 @@ RowNumber Store::Core::rowOf(const Request& request) {
 // What stands is put into the index at its name. What went meanwhile keeps the row it has, or gets
 // one without a place: if it was only moved, the next reconcile finds it and it keeps its document.
 RowNumber Store::Core::rowOfLook(const Request& request, const Looked& looked) {
-    const std::size_t count = index_.count();
-    const RowNumber row = mergeLook(request, looked);
-    if (row != noRow && index_.count() > count && index_.row(row).isFolder()) {
-        index_.row(row).set(Row::unlisted, true);
-    }
-    return row;
-}
-
-RowNumber Store::Core::mergeLook(const Request& request, const Looked& looked) {
     const RowNumber parent = folderRow(request.folder);
     if (looked.stands && parent != noRow) {
         EntryMerger merger(index_, changes_, saves_);

@@ -241,8 +241,6 @@ class Store::Core {
     [[nodiscard]] Expected<DocumentID> lookUpDocument(Request& request) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] RowNumber rowOfLook(const Request& request, const Looked& looked)
         MARROWDALE_REQUIRES(mutex_);
-    [[nodiscard]] RowNumber mergeLook(const Request& request, const Looked& looked)
-        MARROWDALE_REQUIRES(mutex_);
     // The row's document; a new one, noted in `given`, where no name of the file has one. 0 when
     // there are none left.
     [[nodiscard]] std::uint32_t documentOfRow(RowNumber number, std::vector<RowNumber>& given)

@@ -290,6 +290,7 @@ void Store::Core::unwatchTree(RowNumber folder) {
         const RowNumber next = left.back();
         left.pop_back();
         watches_->unwatch(FileID{index_.row(next).fileID});
+        index_.row(next).set(Row::unlisted, true);
         for (RowNumber below = index_.row(next).firstChild(); below != noRow;
              below = index_.row(below).next) {
             if (index_.row(below).isFolder()) {
