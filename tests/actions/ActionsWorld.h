@@ -78,4 +78,9 @@ class ActionsWorld {
     std::unique_ptr<LocalFileProvider> provider_;
 };
 
+// Of what an action answered: its error's, 0 where it has none.
+[[nodiscard]] inline int codeOf(const ActionsWorld::Item& answer) {
+    return answer ? 0 : answer.error().code;
+}
+
 }  // namespace marrowdale::tests

@@ -21,10 +21,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-int codeOf(const ActionsWorld::Item& answer) {
-    return answer ? 0 : answer.error().code;
-}
-
 // Takes all the room that there is.
 class Filler {
   public:

@@ -23,10 +23,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-int codeOf(const ActionsWorld::Item& answer) {
-    return answer ? 0 : answer.error().code;
-}
-
 class HostileTest : public testing::TestWithParam<TestFileSystem> {
   protected:
     ~HostileTest() override { world_.close(); }

@@ -11,7 +11,6 @@
 namespace marrowdale::tests {
 namespace {
 
-constexpr std::string_view workingSet = VantrelWorkingSetContainerItemIdentifier;
 constexpr std::string_view rootContainer = VantrelRootContainerItemIdentifier;
 
 class ChangesTest : public ChangesTestWorld {

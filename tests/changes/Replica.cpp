@@ -6,7 +6,6 @@
 
 #include <gtest/gtest.h>
 
-#include "platform/hostframework/FileProviderConstants.h"
 #include "platform/testing/CollectingChangeObserver.h"
 #include "platform/testing/CollectingObserver.h"
 
@@ -14,7 +13,6 @@ namespace marrowdale::tests {
 
 namespace {
 
-constexpr std::string_view workingSet = VantrelWorkingSetContainerItemIdentifier;
 constexpr std::size_t keptLines = 12;
 
 // What a client is told of an item and can compare. A folder's dates and counts change with what is

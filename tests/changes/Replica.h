@@ -5,12 +5,16 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
+#include "platform/hostframework/FileProviderConstants.h"
 #include "platform/hostframework/FileProviderExtension.h"
 #include "tests/changes/Answer.h"
 
 namespace marrowdale::tests {
+
+inline constexpr std::string_view workingSet = VantrelWorkingSetContainerItemIdentifier;
 
 // A client of a provider: enumerates everything below the root once, and goes by the changes of the
 // working set from then on. It knows identifiers, parents and records, and no disk.

@@ -13,8 +13,8 @@ namespace marrowdale::tests {
 namespace {
 
 constexpr std::uint64_t megabyte = 1U << 20U;
-constexpr std::size_t sector = 512;
-constexpr std::size_t block = 4096;
+constexpr std::size_t sectorSize = 512;
+constexpr std::size_t blockSize = 4096;
 
 void runQuietly(const std::vector<std::string>& words) {
     std::vector<std::string> copies = words;
@@ -62,13 +62,13 @@ std::vector<DiskFormat> diskFormats() {
         {"ext4",
          {"mkfs.ext4", "-q", "-F", "-I", "256", "-E", "nodiscard,lazy_itable_init=0"},
          64 * megabyte,
-         sector,
+         sectorSize,
          "nodiscard"},
-        {"xfs", {"mkfs.xfs", "-q", "-f", "-K"}, 304 * megabyte, sector, "nodiscard"},
+        {"xfs", {"mkfs.xfs", "-q", "-f", "-K"}, 304 * megabyte, sectorSize, "nodiscard"},
         {"btrfs",
          {"mkfs.btrfs", "-q", "-f", "-K", "-m", "single", "-d", "single"},
          256 * megabyte,
-         block,
+         blockSize,
          "nodiscard"},
     };
 }

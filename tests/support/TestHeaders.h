@@ -1,6 +1,5 @@
-// What nearly every test includes, read once for each test program: that and no optimisation halve
-// the build of the tests. The lint does without, and so finds the file that does not name what it
-// uses.
+// What nearly every test includes, read once for all test programs. The lint does without, and so
+// finds the file that does not name what it uses.
 #pragma once
 
 #include <algorithm>

@@ -18,9 +18,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::UnorderedElementsAre;
 
-const std::string notes = "org.example.Notes";
 const std::string notesItem = "#org.example.Notes";
-const std::string sketch = "org.example.Sketch";
 
 class ApplicationDocumentsTest : public ::testing::Test {
   protected:

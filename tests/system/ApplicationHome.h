@@ -7,6 +7,10 @@
 
 namespace marrowdale::tests {
 
+// Identifiers of applications that tests install.
+inline const std::string notes = "org.example.Notes";
+inline const std::string sketch = "org.example.Sketch";
+
 // A home in which a test installs applications.
 class ApplicationHome : public Home {
   public:

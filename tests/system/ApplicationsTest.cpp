@@ -20,9 +20,6 @@ using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 
-const std::string notes = "org.example.Notes";
-const std::string sketch = "org.example.Sketch";
-
 class ApplicationsTest : public ::testing::Test {
   protected:
     [[nodiscard]] std::vector<std::string> apps() const {

@@ -17,8 +17,7 @@ ApplicationPlaces places(const Variables& variables) {
     });
 }
 
-constexpr auto user = ApplicationKind::user;
-constexpr auto system = ApplicationKind::system;
+using enum ApplicationKind;
 
 TEST(ApplicationPlacesTest, aPlainSessionHasTheUsersAndTheSystemsFolders) {
     const auto found = places({{"HOME", "/home/u"}, {"LANG", "de_AT.UTF-8"}});

@@ -11,8 +11,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr auto user = ApplicationKind::user;
-constexpr auto system = ApplicationKind::system;
+using enum ApplicationKind;
 
 class LinuxApplicationRegistryTest : public ApplicationTestWorld {
   protected:

@@ -11,10 +11,10 @@
 namespace marrowdale::native {
 namespace {
 
-using Bit = std::pair<std::uint64_t, std::uint32_t>;
+using FanotifyBit = std::pair<std::uint64_t, std::uint32_t>;
 
 // Every bit that is asked for or comes unasked, and what it means.
-const std::vector<Bit> bits{
+const std::vector<FanotifyBit> fanotifyBits{
     {FAN_MODIFY, WatchHint::changed},
     {FAN_ATTRIB, WatchHint::changed},
     {FAN_CLOSE_WRITE, WatchHint::changed},
@@ -29,12 +29,12 @@ const std::vector<Bit> bits{
 };
 
 TEST(FanotifyMasksTest, everyCombinationMeansWhatItsBitsMean) {
-    for (std::size_t chosen = 0; chosen < std::size_t{1} << bits.size(); ++chosen) {
+    for (std::size_t chosen = 0; chosen < std::size_t{1} << fanotifyBits.size(); ++chosen) {
         std::uint64_t mask = 0;
         std::uint32_t meaning = 0;
-        for (std::size_t i = 0; i < bits.size(); ++i) {
-            mask |= (chosen >> i & 1U) != 0 ? bits[i].first : 0U;
-            meaning |= (chosen >> i & 1U) != 0 ? bits[i].second : 0U;
+        for (std::size_t i = 0; i < fanotifyBits.size(); ++i) {
+            mask |= (chosen >> i & 1U) != 0 ? fanotifyBits[i].first : 0U;
+            meaning |= (chosen >> i & 1U) != 0 ? fanotifyBits[i].second : 0U;
         }
         ASSERT_EQ(FanotifyMasks::what(mask), meaning) << mask;
     }
@@ -42,7 +42,7 @@ TEST(FanotifyMasksTest, everyCombinationMeansWhatItsBitsMean) {
 
 TEST(FanotifyMasksTest, tableKnowsEveryBitThatIsAskedFor) {
     std::uint64_t known = 0;
-    for (const Bit& bit : bits) {
+    for (const FanotifyBit& bit : fanotifyBits) {
         known |= bit.first;
     }
     const std::uint64_t asked =
@@ -52,7 +52,7 @@ TEST(FanotifyMasksTest, tableKnowsEveryBitThatIsAskedFor) {
 
 TEST(FanotifyMasksTest, unknownBitsMeanNothing) {
     std::uint64_t known = 0;
-    for (const Bit& bit : bits) {
+    for (const FanotifyBit& bit : fanotifyBits) {
         known |= bit.first;
     }
     EXPECT_EQ(FanotifyMasks::what(~known), 0U);

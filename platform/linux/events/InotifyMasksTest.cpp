@@ -11,10 +11,10 @@
 namespace marrowdale::native {
 namespace {
 
-using Bit = std::pair<std::uint32_t, std::uint32_t>;
+using InotifyBit = std::pair<std::uint32_t, std::uint32_t>;
 
 // Every bit that is asked for or comes unasked, and what it means.
-const std::vector<Bit> bits{
+const std::vector<InotifyBit> inotifyBits{
     {IN_MODIFY, WatchHint::changed},
     {IN_ATTRIB, WatchHint::changed},
     {IN_CLOSE_WRITE, WatchHint::changed},
@@ -32,12 +32,12 @@ const std::vector<Bit> bits{
 };
 
 TEST(InotifyMasksTest, everyCombinationMeansWhatItsBitsMean) {
-    for (std::size_t chosen = 0; chosen < std::size_t{1} << bits.size(); ++chosen) {
+    for (std::size_t chosen = 0; chosen < std::size_t{1} << inotifyBits.size(); ++chosen) {
         std::uint32_t mask = 0;
         std::uint32_t meaning = 0;
-        for (std::size_t i = 0; i < bits.size(); ++i) {
-            mask |= (chosen >> i & 1U) != 0 ? bits[i].first : 0U;
-            meaning |= (chosen >> i & 1U) != 0 ? bits[i].second : 0U;
+        for (std::size_t i = 0; i < inotifyBits.size(); ++i) {
+            mask |= (chosen >> i & 1U) != 0 ? inotifyBits[i].first : 0U;
+            meaning |= (chosen >> i & 1U) != 0 ? inotifyBits[i].second : 0U;
         }
         ASSERT_EQ(InotifyMasks::what(mask), meaning) << mask;
     }
@@ -45,7 +45,7 @@ TEST(InotifyMasksTest, everyCombinationMeansWhatItsBitsMean) {
 
 TEST(InotifyMasksTest, tableKnowsEveryBitThatIsAskedFor) {
     std::uint32_t known = 0;
-    for (const Bit& bit : bits) {
+    for (const InotifyBit& bit : inotifyBits) {
         known |= bit.first;
     }
     const std::uint32_t asked = InotifyMasks::folder | InotifyMasks::rootToo | InotifyMasks::file;
@@ -54,7 +54,7 @@ TEST(InotifyMasksTest, tableKnowsEveryBitThatIsAskedFor) {
 
 TEST(InotifyMasksTest, unknownBitsMeanNothing) {
     std::uint32_t known = 0;
-    for (const Bit& bit : bits) {
+    for (const InotifyBit& bit : inotifyBits) {
         known |= bit.first;
     }
     EXPECT_EQ(InotifyMasks::what(~known), 0U);

@@ -3,7 +3,6 @@
 #include <cstdlib>
 #include <fstream>
 #include <iterator>
-#include <sys/xattr.h>
 
 #include "platform/linux/store/StoreEventsTestSupport.h"
 #include "platform/testing/TestSkip.h"
@@ -13,9 +12,6 @@ namespace {
 
 using testing::Contains;
 using testing::EndsWith;
-
-constexpr const char* tagName = "user.com.quillory.favorite-rank.number#PS";
-constexpr std::string_view tag("a\0tag", 5);
 
 // Quick and quiet, with nobody's settings; back-ups beside the file, /tmp included.
 constexpr const char* vim =
@@ -67,18 +63,12 @@ class EditorsTest : public StoreEventsTest {
         std::ifstream file(path(below));
         return {std::istreambuf_iterator<char>(file), {}};
     }
-    [[nodiscard]] std::string tagOf(const std::string& below) const {
-        std::string value(100, ' ');
-        const auto size = ::getxattr(path(below).c_str(), tagName, value.data(), value.size());
-        value.resize(size < 0 ? 0 : static_cast<std::size_t>(size));
-        return value;
-    }
     // A folder for each editor, with a document that was told of.
     void beginWithDocuments() {
         for (const Editor& editor : editors()) {
             const std::string document = editor.name + "/doc";
             write(document, "first\n");
-            hasTags_ = ::setxattr(path(document).c_str(), tagName, tag.data(), tag.size(), 0) == 0;
+            hasTags_ = setTag(document);
         }
         begin();
         for (const Editor& editor : editors()) {
@@ -95,7 +85,7 @@ class EditorsTest : public StoreEventsTest {
         EXPECT_EQ(documentOf(place), documents_.at(editor.name));
         EXPECT_EQ(placeOf(documents_.at(editor.name)), place);
         if (hasTags_) {
-            EXPECT_EQ(tagOf(place), tag);
+            EXPECT_EQ(tagOf(place), tagValue);
         }
     }
 

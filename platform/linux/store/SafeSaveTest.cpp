@@ -17,9 +17,6 @@ using testing::Contains;
 using testing::HasSubstr;
 using testing::Not;
 
-constexpr const char* tagName = "user.com.quillory.favorite-rank.number#PS";
-constexpr std::string_view tag("a\0tag", 5);
-
 class SafeSaveTest : public StoreEventsTest {
   protected:
     bool hasTags_ = false;
@@ -27,7 +24,7 @@ class SafeSaveTest : public StoreEventsTest {
     // A document "doc" that was told of, and what goes with it.
     DocumentID beginWithDocument() {
         write("doc", "first");
-        hasTags_ = ::setxattr(path("doc").c_str(), tagName, tag.data(), tag.size(), 0) == 0;
+        hasTags_ = setTag("doc");
         write("other", "x");
         makeFolder(path("folder"));
         begin();
@@ -35,12 +32,6 @@ class SafeSaveTest : public StoreEventsTest {
         (void)news();
         settle();
         return document;
-    }
-    [[nodiscard]] std::string tagOf(const std::string& below) const {
-        std::string value(100, ' ');
-        const auto size = ::getxattr(path(below).c_str(), tagName, value.data(), value.size());
-        value.resize(size < 0 ? 0 : static_cast<std::size_t>(size));
-        return value;
     }
     void exchange(const std::string& a, const std::string& b) {
         ASSERT_EQ(
@@ -53,7 +44,7 @@ class SafeSaveTest : public StoreEventsTest {
         EXPECT_EQ(documentOf(name), document);
         EXPECT_THAT(texts, Contains("moved document"));
         if (hasTags_) {
-            EXPECT_EQ(tagOf(name), tag) << "tags stay with the document";
+            EXPECT_EQ(tagOf(name), tagValue) << "tags stay with the document";
         }
         // A program that saves in two steps may be seen in between; then it is there again.
         EXPECT_THAT(texts, Contains(HasSubstr(" " + name)));
@@ -296,7 +287,7 @@ TEST_P(SafeSaveTest, TagsComeWhenTheFileCanBeWritten) {
     EXPECT_EQ(tagOf("doc"), "");
     ASSERT_EQ(::chmod(path("doc").c_str(), 0600), 0);
     (void)news();
-    EXPECT_EQ(tagOf("doc"), isLive() ? tag : "") << "what waits does not outlast a restart";
+    EXPECT_EQ(tagOf("doc"), isLive() ? tagValue : "") << "what waits does not outlast a restart";
 }
 
 TEST_P(SafeSaveTest, WhatIsMovedOutAndBackIsTheSame) {

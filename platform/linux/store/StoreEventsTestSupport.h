@@ -2,6 +2,8 @@
 
 #include <ostream>
 #include <string>
+#include <string_view>
+#include <sys/xattr.h>
 #include <tuple>
 #include <vector>
 
@@ -24,6 +26,10 @@ inline std::ostream& operator<<(std::ostream& out, Following following) {
     constexpr std::array<const char*, 3> names{"fanotify", "inotify", "restart"};
     return out << names.at(static_cast<std::size_t>(following));
 }
+
+// A tag that a document carries: an attribute that is kept when other programs save the document.
+inline constexpr const char* tagName = "user.com.quillory.favorite-rank.number#PS";
+inline constexpr std::string_view tagValue("a\0tag", 5);
 
 // One event, as text: "gone a", "appeared folder/b", "renamed to", "changed c", with " (did=N)" for
 // a document that is gone with it.
@@ -135,6 +141,16 @@ class StoreEventsTest : public StoreTestBaseOf<std::tuple<TestFileSystem, Follow
             document = assign(whole.parent_path().string()).at(whole.filename().string());
         });
         return document;
+    }
+    // False where the file system keeps no tags.
+    [[nodiscard]] bool setTag(const std::string& below) const {
+        return ::setxattr(path(below).c_str(), tagName, tagValue.data(), tagValue.size(), 0) == 0;
+    }
+    [[nodiscard]] std::string tagOf(const std::string& below) const {
+        std::string value(100, ' ');
+        const auto size = ::getxattr(path(below).c_str(), tagName, value.data(), value.size());
+        value.resize(size < 0 ? 0 : static_cast<std::size_t>(size));
+        return value;
     }
     [[nodiscard]] std::string placeOf(DocumentID document) {
         std::string place;

@@ -22,6 +22,9 @@
 
 namespace marrowdale {
 
+// When an item went into the trash, as it stands on disk.
+inline constexpr const char* trashDateName = "user.com.quillory.trash.time#PS";
+
 // For tests of actions: real folders, with an app library "#org.example.Notes" beside the storage
 // root. Paths that begin with "app:" lie in its documents folder.
 class ActionsTest : public ::testing::TestWithParam<TestFileSystem> {
@@ -93,5 +96,11 @@ class ActionsTest : public ::testing::TestWithParam<TestFileSystem> {
     TestWorld world_{directory_, {}, TestWorld::Serving::wholeDirectory};
     const Platform& platform_ = world_.platform;
 };
+
+// In a test of ActionsTest.
+#define MARROWDALE_NEED_ATTRIBUTES()                                 \
+    if (!hasAttributes()) {                                          \
+        MARROWDALE_SKIP("the file system keeps no user attributes"); \
+    }
 
 }  // namespace marrowdale

@@ -53,11 +53,6 @@ class MetadataActionsTest : public ActionsTest {
 INSTANTIATE_TEST_SUITE_P(OnEach, MetadataActionsTest, ::testing::ValuesIn(testFileSystems()),
                          testFileSystemName);
 
-#define MARROWDALE_NEED_ATTRIBUTES()                                 \
-    if (!hasAttributes()) {                                          \
-        MARROWDALE_SKIP("the file system keeps no user attributes"); \
-    }
-
 TEST_P(MetadataActionsTest, aLastUsedDateIsSetAndCleared) {
     MARROWDALE_NEED_ATTRIBUTES();
     const std::string item = made("a");

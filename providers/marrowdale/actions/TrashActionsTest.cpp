@@ -11,7 +11,6 @@ namespace marrowdale {
 namespace {
 
 using Operation = FaultInjectingFileOperations::Operation;
-constexpr const char* dateName = "user.com.quillory.trash.time#PS";
 constexpr const char* putBackName = "user.com.quillory.trash.putback#PS";
 
 class TrashActionsTest : public ActionsTest {
@@ -36,15 +35,9 @@ class TrashActionsTest : public ActionsTest {
                                  : std::unexpected(UnarchiveError::invalidResultingClass);
         return object ? std::optional(*object) : std::nullopt;
     }
-    bool needAttributes() const { return hasAttributes(); }
 };
 INSTANTIATE_TEST_SUITE_P(OnEach, TrashActionsTest, ::testing::ValuesIn(testFileSystems()),
                          testFileSystemName);
-
-#define MARROWDALE_NEED_ATTRIBUTES()                                 \
-    if (!needAttributes()) {                                         \
-        MARROWDALE_SKIP("the file system keeps no user attributes"); \
-    }
 
 TEST_P(TrashActionsTest, aTrashedItemCarriesDateAndPutBack) {
     MARROWDALE_NEED_ATTRIBUTES();
@@ -75,7 +68,7 @@ TEST_P(TrashActionsTest, theUsersOwnDocumentsHaveNoPutBack) {
     MARROWDALE_NEED_ATTRIBUTES();
     const std::string item = made("a.txt");
     ASSERT_TRUE(trash(item));
-    EXPECT_TRUE(attribute(path(".Trash/a.txt"), dateName));
+    EXPECT_TRUE(attribute(path(".Trash/a.txt"), trashDateName));
     EXPECT_FALSE(attribute(path(".Trash/a.txt"), putBackName));
     EXPECT_EQ(count("[ERROR] couldn't find app library for " + url("a.txt").absoluteString()), 1U);
 }
@@ -213,7 +206,7 @@ TEST_P(TrashActionsTest, untrashGoesBackWhereTheItemWas) {
     ASSERT_TRUE(back) << back.error().description();
     EXPECT_EQ((*back)->fileURL, url("app:Work/a"));
     EXPECT_FALSE((*back)->isTrashed);
-    EXPECT_FALSE(attribute(path("app:Work/a"), dateName));
+    EXPECT_FALSE(attribute(path("app:Work/a"), trashDateName));
     EXPECT_TRUE(attribute(path("app:Work/a"), putBackName));
     EXPECT_TRUE(logHasInOrder(
         {" untrash item \"" + item + "\"", " fetching item's properties for \"" + item + "\"",
@@ -334,7 +327,7 @@ TEST_P(TrashActionsTest, attributesOfAnyBytesDoNoHarm) {
           archive(ArchivedObject(Number(std::int64_t{5})))->text()}) {
         const std::string item = made("app:.Trash/a");
         setAttribute(path("app:.Trash/a"), putBackName, bytes);
-        setAttribute(path("app:.Trash/a"), dateName, bytes);
+        setAttribute(path("app:.Trash/a"), trashDateName, bytes);
         EXPECT_TRUE(untrash(item));
         EXPECT_TRUE(trash(item));
         EXPECT_EQ(remove(item), std::nullopt);

@@ -11,14 +11,11 @@ namespace marrowdale {
 namespace {
 
 using Operation = FaultInjectingFileOperations::Operation;
-constexpr const char* dateName = "user.com.quillory.trash.time#PS";
 
 class TrashPurgeTest : public ActionsTest {
   protected:
     void SetUp() override {
-        if (!hasAttributes()) {
-            MARROWDALE_SKIP("the file system keeps no user attributes");
-        }
+        MARROWDALE_NEED_ATTRIBUTES();
         makeFolder(path(".Trash"));
         makeFolder(path("app:.Trash"));
     }
@@ -27,7 +24,7 @@ class TrashPurgeTest : public ActionsTest {
         setDate(name, date);
     }
     void setDate(std::string_view name, const Date& date) {
-        setAttribute(path(name), dateName, archive(ArchivedObject(date))->text());
+        setAttribute(path(name), trashDateName, archive(ArchivedObject(date))->text());
     }
     std::optional<Date> dateOf(std::string_view name) {
         const auto data = initWithValueOfXattr(platform_, trashDateAttribute, url(name));
@@ -94,7 +91,7 @@ TEST_P(TrashPurgeTest, whatHasADamagedDateGetsThePresentOne) {
          {std::string(), std::string("bplist00"), archive(ArchivedObject(std::string("x")))->text(),
           std::string(1000, '\xff')}) {
         writeFile(path(".Trash/damaged"), "");
-        setAttribute(path(".Trash/damaged"), dateName, bytes);
+        setAttribute(path(".Trash/damaged"), trashDateName, bytes);
         world_.sink->clear();
         purge();
         ASSERT_TRUE(exists(".Trash/damaged"));
@@ -137,7 +134,7 @@ TEST_P(TrashPurgeTest, aTrashThatIsALinkIsNotPurged) {
     std::filesystem::remove(path(".Trash"));
     makeFolder(directory_.path("elsewhere"));
     writeFile(directory_.path("elsewhere/old"), "");
-    setAttribute(directory_.path("elsewhere/old"), dateName,
+    setAttribute(directory_.path("elsewhere/old"), trashDateName,
                  archive(ArchivedObject(before_))->text());
     std::filesystem::create_directory_symlink(directory_.path("elsewhere"), path(".Trash"));
     purge();

@@ -324,7 +324,7 @@ TEST_P(FSEventReaderEventsTest, theIdentifierNeverGoesBack) {
     EXPECT_EQ(delegate_->told.size(), 3U);
 }
 
-struct Condition {
+struct StreamCondition {
     std::uint32_t flags;
     std::vector<std::string> told;
     std::uint64_t counted;
@@ -336,7 +336,7 @@ TEST_P(FSEventReaderEventsTest, everyCombinationOfConditionsIsTold) {
     const Lines reset{"reset"};
     const Lines done{"history 11"};
     const Lines both{"reset", "history 11"};
-    const std::vector<Condition> table{
+    const std::vector<StreamCondition> table{
         {userDropped, reset, 11},
         {kernelDropped, reset, 11},
         {userDropped | kernelDropped, reset, 11},
@@ -353,7 +353,7 @@ TEST_P(FSEventReaderEventsTest, everyCombinationOfConditionsIsTold) {
         {eventIDsWrapped | kernelDropped | historyDone, reset, 10},
         {eventIDsWrapped | userDropped | kernelDropped | historyDone, reset, 10},
     };
-    for (const Condition& condition : table) {
+    for (const StreamCondition& condition : table) {
         reader_->stop();
         startReader();
         delegate_->told.clear();
