@@ -31,6 +31,7 @@ struct CommonAttributes {
     FileType type = FileType::other;
     DocumentID documentID{};  // 0 when the document has none yet
     FileID fileID{};
+    std::uint32_t linkCount = 0;  // the number of names, as the file system keeps it
 };
 
 // What a look at items is to bring along on each URL; see DirectoryEnumerationRequest.

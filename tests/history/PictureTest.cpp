@@ -73,6 +73,25 @@ TEST_P(SteppedPictureTest, AFolderThatIsAwayWhileEventsOfItsFilesAreRead) {
     expectWhole();
 }
 
+// A link of two names is no less in sight when one of them goes out of it than a file is.
+TEST_P(SteppedPictureTest, AFileAndALinkWhoseOtherNameIsHidden) {
+    makeFolder(root());
+    writeFile(path("target"), "x");
+    begin();
+    writeFile(path("file"), "x");
+    std::filesystem::create_symlink("target", path("link"));
+    for (const char* name : {"file", "link"}) {
+        ASSERT_EQ(::link(path(name).c_str(), path(name + std::string("2")).c_str()), 0);
+    }
+    catchUp();
+    expectWhole();
+    for (const char* name : {"file", "link"}) {
+        std::filesystem::rename(path(name + std::string("2")), path("." + std::string(name)));
+    }
+    catchUp();
+    expectWhole();
+}
+
 INSTANTIATE_TEST_SUITE_P(OnEach, SteppedPictureTest, followedBy(byListening), historyParameterName);
 
 // The writer goes on while the store is closed and opened, at moments that no seed repeats.

@@ -100,7 +100,8 @@ Expected<CommonAttributes> LinuxFileSystem::commonAttributes(const OpenFile& fil
         return Unexpected(withPath(status.error(), file.url()));
     }
     return CommonAttributes{status->device, fileTypeOf(*status),
-                            sources_.documents.knownDocumentID(*status), status->fileID};
+                            sources_.documents.knownDocumentID(*status), status->fileID,
+                            status->linkCount};
 }
 
 Expected<FileStatus> LinuxFileSystem::status(const URL& url) {

@@ -273,9 +273,11 @@ bool FSEventReader::tellOutOfSight(const Run& run, FSEventReaderDelegate& delega
     if (!isMoveToHere(event) && !says(event, FileEventFlag::documentMoved)) {
         return true;
     }
-    const auto status = platform_.fileSystem.status(url);
-    const bool hasOtherNames =
-        status && status->fileID == event.fileID && !status->isDirectory && status->linkCount > 1;
+    const auto file = platform_.fileSystem.openForEvents(url);
+    const auto attributes = file ? platform_.fileSystem.commonAttributes(**file)
+                                 : Expected<CommonAttributes>(Unexpected(file.error()));
+    const bool hasOtherNames = attributes && attributes->fileID == event.fileID &&
+                               attributes->type != FileType::directory && attributes->linkCount > 1;
     return hasOtherNames || tellDocumentAt(run, delegate, event, url);
 }
 
