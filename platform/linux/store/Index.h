@@ -100,7 +100,7 @@ class Index {
     // kind.
     [[nodiscard]] bool restoreTouch(RowNumber number, const Row& values);
     void freeRestoredRow(RowNumber number);
-    // False when there is no such row.
+    // False when there is no such row that could have some.
     [[nodiscard]] bool restoreAttributes(RowNumber number, CarriedAttributes attributes);
     // Room for a chunk's worth of rows that the caller fills, in order from row 0.
     [[nodiscard]] Row* addRawRows(RowNumber count);
