@@ -135,7 +135,7 @@ class TreeChanges {
     void flushLimbo();
     void flushTouched();
     void flushRow(RowNumber number, std::uint32_t bits);
-    void flushMove(RowNumber number, const Told& told, const Place& now);
+    void flushMove(RowNumber number, Told told, const Place& now);
     void flushGoneDocuments();
     void flushPackages();
     void flushOtherNames();
