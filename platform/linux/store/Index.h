@@ -65,6 +65,9 @@ class Index {
     [[nodiscard]] RowNumber addInLimbo(std::string_view name, const Row& values);
     // Takes a placed row off its folder.
     void putInLimbo(RowNumber number);
+    // The folder that a file in limbo was taken off, by this run or the one before; noRow where
+    // none is known. Its row may be another folder's by now, where that was freed.
+    [[nodiscard]] RowNumber folderLeft(RowNumber number) const;
     // Whether rows are in limbo; and which.
     [[nodiscard]] bool hasLimbo() const;
     [[nodiscard]] std::vector<RowNumber> limboRows() const;

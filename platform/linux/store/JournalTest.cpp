@@ -162,6 +162,23 @@ TEST_F(JournalTest, ARowThatIsRemovedTakesItsAttributesAlong) {
     EXPECT_TRUE(world_.index().attributes(row).empty());
 }
 
+TEST_F(JournalTest, AFileInLimboIsLoadedWithTheFolderThatItLeft) {
+    world_.open();
+    addRoot();
+    addFile("a", 2);
+    const RowNumber row = world_.index().child(rootRow, "a");
+    EXPECT_EQ(world_.index().folderLeft(row), noRow);
+    world_.index().putInLimbo(row);
+    world_.commit();
+    world_.close();
+    world_.open();
+    EXPECT_EQ(world_.index().folderLeft(row), rootRow);
+    EXPECT_EQ(world_.index().name(row), "a");
+    ASSERT_TRUE(world_.index().place(row, rootRow, "b"));
+    EXPECT_EQ(world_.index().folderLeft(row), noRow);
+    EXPECT_EQ(world_.index().row(row).attributes, 0U);
+}
+
 TEST_F(JournalTest, PathsOfAnyBytesComeBack) {
     world_.open();
     std::vector<std::string> paths{"",

@@ -165,6 +165,20 @@ TEST_F(SafeSavesTest, NorDoesItWhenTheNameIsTakenLater) {
     EXPECT_EQ(documentAt("doc"), document);
 }
 
+// A request had what was found committed, and the process was killed before the decision.
+TEST_F(SafeSavesTest, ANameThatWasLeftInTheRunBeforeIsDecidedAbout) {
+    appear("doc", 11);
+    ASSERT_EQ(index_.limboRows().size(), 1U);
+    TreeChanges changes(index_, packages_);
+    SafeSaves saves(index_, changes, own_);
+    changes.recallDepartures();
+    const auto transfers = saves.settle(DeviceID{1}, SafeSaves::Knowledge::result,
+                                        SafeSaves::Clock::time_point(std::chrono::seconds(1)));
+    ASSERT_EQ(transfers.size(), 1U);
+    EXPECT_EQ(transfers.front().document, document);
+    EXPECT_EQ(documentAt("doc"), document);
+}
+
 TEST_F(SafeSavesTest, AnUnlinkedNameThatIsMadeAnew) {
     vanish("doc");
     (void)settleAt(std::chrono::seconds(100));
