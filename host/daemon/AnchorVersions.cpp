@@ -1,5 +1,8 @@
 #include "host/daemon/AnchorVersions.h"
 
+#include <initializer_list>
+#include <utility>
+
 #include "platform/foundation/PropertyList.h"
 
 namespace marrowdale::host {
@@ -9,27 +12,50 @@ namespace {
 // Anchors come from anywhere; a real one is far smaller.
 constexpr PropertyListLimits limits{.depth = 2, .objects = 64, .bytes = 4096};
 
-}  // namespace
-
-std::optional<std::uint64_t> libraryVersionIn(const Data& anchor) {
+std::optional<std::uint64_t> numberIn(const Data& anchor, const char* key) {
     const auto list = decodePropertyList(anchor.bytes(), limits);
     const auto* fields = list ? list->as<PropertyListDictionary>() : nullptr;
     if (!fields) {
         return std::nullopt;
     }
-    const auto version = fields->find(anchorLibraryVersionKey);
-    return version == fields->end() ? std::nullopt : version->second.asUnsigned();
+    const auto number = fields->find(key);
+    return number == fields->end() ? std::nullopt : number->second.asUnsigned();
 }
 
-Data withoutLibraryVersion(const Data& anchor) {
+// With other numbers under keys that it has.
+Data with(const Data& anchor,
+          std::initializer_list<std::pair<const char*, std::uint64_t>> numbers) {
     const auto list = decodePropertyList(anchor.bytes(), limits);
     const auto* fields = list ? list->as<PropertyListDictionary>() : nullptr;
-    if (!fields || !libraryVersionIn(anchor)) {
+    if (!fields) {
         return anchor;
     }
     PropertyListDictionary changed = *fields;
-    changed.insert_or_assign(anchorLibraryVersionKey, PropertyList(std::uint64_t{0}));
+    for (const auto& [key, number] : numbers) {
+        if (const auto field = changed.find(key); field != changed.end()) {
+            field->second = PropertyList(number);
+        }
+    }
     return encodePropertyList(PropertyList(std::move(changed))).value_or(anchor);
+}
+
+}  // namespace
+
+std::optional<std::uint64_t> libraryVersionIn(const Data& anchor) {
+    return numberIn(anchor, anchorLibraryVersionKey);
+}
+
+std::optional<EventID> eventIn(const Data& anchor) {
+    const auto number = numberIn(anchor, anchorEventKey);
+    return number ? std::optional(EventID{*number}) : std::nullopt;
+}
+
+Data withEvent(const Data& anchor, EventID event) {
+    return with(anchor, {{anchorEventKey, raw(event)}, {anchorOffsetKey, 0}});
+}
+
+Data withoutLibraryVersion(const Data& anchor) {
+    return libraryVersionIn(anchor) ? with(anchor, {{anchorLibraryVersionKey, 0}}) : anchor;
 }
 
 }  // namespace marrowdale::host

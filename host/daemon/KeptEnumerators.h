@@ -17,7 +17,8 @@ namespace marrowdale::host {
 // Enumerators of the root, the working set and all directories that wait for their clients to come
 // back. Such an enumerator goes on only from an anchor of the version of the app libraries that it
 // knows itself, and the next request brings it up to the newest; so a client whose anchor is of an
-// older version is answered only by one that was kept since then. A few are kept for each version,
+// older version is answered by one that was kept since then, or, at a higher price, with the help
+// of LibraryChanges. A few are kept for each version,
 // as several clients may hold anchors of it; those that waited longest are let go first.
 //
 // Any thread. Whoever takes one out has it for himself.

@@ -3,7 +3,7 @@
 #include <cstddef>
 #include <unistd.h>
 
-#include "platform/foundation/KeyedArchive.h"
+#include "host/daemon/LibraryList.h"
 #include "platform/linux/files/CRC32C.h"
 
 namespace marrowdale::host {
@@ -11,10 +11,6 @@ namespace marrowdale::host {
 namespace {
 
 constexpr const char* witnessName = "app-libraries.witness";
-// The extension's own files and the one key in them that matters here.
-constexpr const char* mainListName = "Marrowdale/app-libraries.plist";
-constexpr const char* workingSetListName = "Marrowdale/searchable-app-libraries.plist";
-constexpr std::string_view versionKey = "versionToken";
 
 constexpr const char* markField = "mark";
 constexpr const char* versionField = "version";
@@ -24,19 +20,6 @@ constexpr const char* checksumField = "checksum";
 
 URL in(const std::string& folder, const char* name) {
     return URL::fileURL(folder + "/" + name);
-}
-
-std::uint64_t versionIn(const Data& list) {
-    const auto archived = unarchive(list.bytes());
-    const auto* fields = archived ? archived->as<ArchivedDictionary>() : nullptr;
-    const auto field = fields ? fields->find(versionKey) : ArchivedDictionary::const_iterator();
-    const auto* number = fields && field != fields->end() ? field->second.as<Number>() : nullptr;
-    if (number == nullptr) {
-        return 0;
-    }
-    const auto* positive = std::get_if<std::uint64_t>(number);
-    const auto* other = std::get_if<std::int64_t>(number);
-    return positive ? *positive : other && *other > 0 ? static_cast<std::uint64_t>(*other) : 0;
 }
 
 std::optional<std::uint64_t> numberIn(const PropertyListDictionary& fields, const char* name) {
@@ -63,8 +46,8 @@ LibraryWitness::LibraryWitness(const std::string& stateFolder, const std::string
       lists_(dataHome),
       packages_(PropertyListArray(packageExtensions.begin(), packageExtensions.end())),
       witnessURL_(in(stateFolder, witnessName)),
-      mainListURL_(in(dataHome, mainListName)),
-      workingSetListURL_(in(dataHome, workingSetListName)) {
+      mainListURL_(in(dataHome, mainLibraryListName)),
+      workingSetListURL_(in(dataHome, workingSetLibraryListName)) {
     const bool isKnown = readWitness();
     const Seen now = look();
     const bool goesOn = isKnown && now.goesOnFrom(seen_);
@@ -117,7 +100,7 @@ LibraryWitness::Seen LibraryWitness::look() {
     if (!list) {
         return {};
     }
-    const Seen seen{.version = versionIn(*list),
+    const Seen seen{.version = libraryListIn(*list).version,
                     .size = list->size(),
                     .checksum = native::crc32c(std::as_bytes(list->bytes()))};
     return seen.version == 0 ? Seen() : seen;

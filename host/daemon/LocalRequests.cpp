@@ -5,6 +5,7 @@
 #include <future>
 #include <utility>
 
+#include "host/daemon/AnchorVersions.h"
 #include "host/daemon/ChangesCollector.h"
 #include "host/daemon/LocalListing.h"
 #include "platform/hostframework/FileProviderConstants.h"
@@ -20,6 +21,17 @@ bool isSystemContainer(std::string_view identifier) {
     return identifier == VantrelRootContainerItemIdentifier ||
            identifier == VantrelWorkingSetContainerItemIdentifier ||
            identifier == VantrelAllDirectoriesContainerItemIdentifier;
+}
+
+// All libraries of now are among the updates.
+void addGoneLibraries(const std::set<std::string>& known, ItemChanges& changes) {
+    for (const std::string& identifier : known) {
+        const bool isThere = std::ranges::any_of(
+            changes.updated, [&](const auto& item) { return item->itemIdentifier == identifier; });
+        if (!isThere && std::ranges::find(changes.deleted, identifier) == changes.deleted.end()) {
+            changes.deleted.push_back(identifier);
+        }
+    }
 }
 
 std::optional<std::string> resolved(const std::string& path) {
@@ -124,6 +136,17 @@ Expected<ItemChanges> LocalRequests::changes(std::string_view container, const D
         }
         enumerator = std::move(*fresh);
     }
+    auto changes = ask(container, since, std::move(enumerator));
+    if (isSystemContainer(container)) {
+        if (auto instead = bridged(container, since, changes)) {
+            return std::move(*instead);
+        }
+    }
+    return changes;
+}
+
+Expected<ItemChanges> LocalRequests::ask(std::string_view container, const Data& since,
+                                         std::unique_ptr<FileProviderEnumerator> enumerator) {
     const auto collector = std::make_shared<ChangesCollector>();
     enumerator->enumerateChangesForObserver(collector, since);
     auto changes = collector->wait();
@@ -132,6 +155,31 @@ Expected<ItemChanges> LocalRequests::changes(std::string_view container, const D
     }
     release(container, changes ? std::optional(changes->anchor) : std::nullopt,
             std::move(enumerator));
+    return changes;
+}
+
+// Where nobody answers from the anchor's version, and where somebody did who was brought to another
+// one, but the anchor's event lies behind the coming of a library that its holder is told of now.
+std::optional<Expected<ItemChanges>> LocalRequests::bridged(std::string_view container,
+                                                            const Data& since,
+                                                            const Expected<ItemChanges>& answer) {
+    const bool isExpired = !answer && answer.error() == errorSyncAnchorExpired();
+    const bool isBroughtOn = answer && libraryVersionIn(answer->anchor) != libraryVersionIn(since);
+    if (services_.libraryChanges == nullptr || !(isExpired || isBroughtOn)) {
+        return std::nullopt;
+    }
+    const auto bridge = services_.libraryChanges->bridge(since);
+    if (!bridge || (isBroughtOn && !bridge->isMoved)) {
+        return std::nullopt;
+    }
+    auto enumerator = enumeratorOf(container);
+    if (!enumerator) {
+        return Unexpected(enumerator.error());
+    }
+    auto changes = ask(container, bridge->anchor, std::move(*enumerator));
+    if (changes) {
+        addGoneLibraries(bridge->known, *changes);
+    }
     return changes;
 }
 

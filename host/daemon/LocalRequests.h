@@ -10,6 +10,7 @@
 
 #include "host/daemon/AppLibraries.h"
 #include "host/daemon/KeptEnumerators.h"
+#include "host/daemon/LibraryChanges.h"
 #include "host/daemon/LocalActions.h"
 #include "host/daemon/ReplicaKeeper.h"
 #include "host/daemon/SignalHub.h"
@@ -33,6 +34,8 @@ struct LocalServices {
     // Called once the extension knows which app libraries there are, and after every later refresh;
     // may be null.
     std::function<void()> librariesAreKnown = nullptr;
+    // By which anchors of older versions of the app libraries are answered; may be null.
+    const LibraryChanges* libraryChanges = nullptr;
     // Watches the trashes of all documents folders of now; may be null.
     std::function<std::unique_ptr<TrashWatch>()> watchTrashes = nullptr;
 };
@@ -94,6 +97,13 @@ class LocalRequests final : public HostRequests {
     // Keeps the enumerator for whoever comes back with that anchor; without one it has ended.
     void release(std::string_view container, const std::optional<Data>& anchor,
                  std::unique_ptr<FileProviderEnumerator> enumerator);
+    // Asks the enumerator, and keeps it for whoever comes back with the anchor of its answer.
+    [[nodiscard]] Expected<ItemChanges> ask(std::string_view container, const Data& since,
+                                            std::unique_ptr<FileProviderEnumerator> enumerator);
+    // What is answered instead: no value where the answer holds.
+    [[nodiscard]] std::optional<Expected<ItemChanges>> bridged(std::string_view container,
+                                                               const Data& since,
+                                                               const Expected<ItemChanges>& answer);
     void renewWatches();
 
     LocalServices services_;

@@ -1,8 +1,21 @@
 #include "host/daemon/ServedLibraries.h"
 
 #include <string_view>
+#include <utility>
 
 namespace marrowdale::host {
+
+namespace {
+
+std::vector<std::string> identifiersOf(const std::vector<std::string>& paths) {
+    std::vector<std::string> identifiers;
+    for (auto& folder : ServedLibraries::foldersAt(paths)) {
+        identifiers.push_back(std::move(folder.key));
+    }
+    return identifiers;
+}
+
+}  // namespace
 
 std::vector<native::LibraryFolder> ServedLibraries::foldersAt(
     const std::vector<std::string>& paths) {
@@ -26,11 +39,16 @@ std::vector<std::string> ServedLibraries::roots() const {
 }
 
 void ServedLibraries::attach(native::Store& store, native::ServedTrees& trees,
-                             const std::vector<std::string>& paths, Log& log) {
+                             const std::vector<std::string>& paths, Log& log,
+                             LibraryChanges* changes) {
     const MutexLock lock(mutex_);
     store_ = &store;
     trees_ = &trees;
     log_ = &log;
+    changes_ = changes;
+    if (changes_ != nullptr) {
+        changes_->begin(identifiersOf(paths), store.lastEventOfEarlierRuns());
+    }
     if (paths_ != paths) {
         apply();
     }
@@ -44,8 +62,11 @@ void ServedLibraries::set(const std::vector<std::string>& paths) {
     }
 }
 
-// Served first: what the store tells of is looked at.
+// Noted first, then served: what the store tells of is looked at.
 void ServedLibraries::apply() {
+    if (changes_ != nullptr) {
+        changes_->note(identifiersOf(paths_), store_->lastEventID());
+    }
     trees_->setRoots(rootsWith(paths_));
     if (auto done = store_->setLibraries(foldersAt(paths_)); !done) {
         log_->error("the documents of applications can't be recorded: " +

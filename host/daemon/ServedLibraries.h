@@ -3,6 +3,7 @@
 #include <string>
 #include <vector>
 
+#include "host/daemon/LibraryChanges.h"
 #include "platform/foundation/Mutex.h"
 #include "platform/linux/files/ServedTrees.h"
 #include "platform/linux/store/Store.h"
@@ -21,9 +22,10 @@ class ServedLibraries {
     explicit ServedLibraries(std::string rootPath) : rootPath_(std::move(rootPath)) {}
 
     // From now on `set` tells these, which outlive the calls. They know the folders of `paths`
-    // already; what was set meanwhile is told now.
+    // already, but for the changes (may be null), which are told of them; what was set meanwhile is
+    // told now.
     void attach(native::Store& store, native::ServedTrees& trees,
-                const std::vector<std::string>& paths, Log& log);
+                const std::vector<std::string>& paths, Log& log, LibraryChanges* changes = nullptr);
     // These are all of the folders now. Returns when they are recorded and served, or can't be,
     // which the store reports.
     void set(const std::vector<std::string>& paths);
@@ -42,6 +44,7 @@ class ServedLibraries {
     std::vector<std::string> paths_ MARROWDALE_GUARDED_BY(mutex_);
     native::Store* store_ MARROWDALE_GUARDED_BY(mutex_) = nullptr;
     native::ServedTrees* trees_ MARROWDALE_GUARDED_BY(mutex_) = nullptr;
+    LibraryChanges* changes_ MARROWDALE_GUARDED_BY(mutex_) = nullptr;
     Log* log_ MARROWDALE_GUARDED_BY(mutex_) = nullptr;
 };
 

@@ -10,6 +10,7 @@
 #include "host/daemon/Doctor.h"
 #include "host/daemon/ExtensionModule.h"
 #include "host/daemon/HostManager.h"
+#include "host/daemon/LibraryChanges.h"
 #include "host/daemon/LibraryWitness.h"
 #include "host/daemon/MarkedFileEvents.h"
 #include "host/daemon/Mounts.h"
@@ -29,11 +30,21 @@
 
 namespace marrowdale::host {
 
+namespace {
+
+// The extension needs one, whether or not the user has a home.
+std::string dataFolder(const Settings& settings) {
+    return settings.dataHome.empty() ? settings.stateFolder + "/data" : settings.dataHome;
+}
+
+}  // namespace
+
 // The applications, and what sees to it that their documents are recorded and served. Made before
 // the store, which is opened with the folders that are there.
 struct World::ApplicationSide {
     ApplicationSide(const WorldOptions& options, Log& log)
-        : libraries(options.settings.rootPath),
+        : libraryChanges(options.settings.stateFolder, dataFolder(options.settings), &log),
+          libraries(options.settings.rootPath),
           applications(
               {.storageRoot = options.settings.rootPath,
                .cacheFolder = options.settings.cacheFolder,
@@ -46,6 +57,7 @@ struct World::ApplicationSide {
           packageExtensions(applications.registry().knownPackageExtensions()),
           packages(packageExtensions) {}
 
+    LibraryChanges libraryChanges;
     ServedLibraries libraries;
     Applications applications;
     const std::vector<std::string> foldersAtStart;
@@ -102,8 +114,8 @@ class World::Parts {
                     .deviceInformation = deviceInformation_,
                     .icons = icons_,
                     .imageEncoder = imageEncoder_} {
-        applicationSide_->libraries.attach(*store_, trees_, applicationSide_->foldersAtStart,
-                                           *log_);
+        applicationSide_->libraries.attach(*store_, trees_, applicationSide_->foldersAtStart, *log_,
+                                           &applicationSide_->libraryChanges);
     }
 
     ~Parts() {
@@ -137,7 +149,12 @@ class World::Parts {
             .stateFolder = options_.settings.stateFolder,
             .findings = [this] { return findings(); },
             .forgetApplications = [this] { applications_.forgetIcons(); },
-            .librariesAreKnown = [this] { libraryWitness_.lookAgain(); },
+            .librariesAreKnown =
+                [this] {
+                    libraryWitness_.lookAgain();
+                    applicationSide_->libraryChanges.listIsKnown();
+                },
+            .libraryChanges = &applicationSide_->libraryChanges,
             .watchTrashes =
                 [this] {
                     return std::make_unique<TrashWatch>(fileEvents_, manager_.signals(), *log_,
@@ -172,11 +189,6 @@ class World::Parts {
                           std::back_inserter(findings));
         std::ranges::move(applications_.findings(), std::back_inserter(findings));
         return findings;
-    }
-
-    // The extension needs one, whether or not the user has a home.
-    [[nodiscard]] static std::string dataFolder(const Settings& settings) {
-        return settings.dataHome.empty() ? settings.stateFolder + "/data" : settings.dataHome;
     }
 
     WorldOptions options_;

@@ -195,7 +195,13 @@ void LocalRootEnumerator::saveWorkingSetCache() const {
     const BundleRecords records = appLibraryManager_->records();
     const std::uint64_t token = appLibraryManager_->versionToken();
     Expected<std::uint64_t> saved = 0;
-    cache.queue().sync([&] { saved = cache.save(records, token, LocalAppLibraryCache::Bump::no); });
+    cache.queue().sync([&] {
+        // Another one may have been brought further, and saved that, since this one was upgraded.
+        const std::uint64_t there = cache.versionToken();
+        if (there <= token || there > mainCacheVersion()) {
+            saved = cache.save(records, token, LocalAppLibraryCache::Bump::no);
+        }
+    });
     if (!saved) {
         platform_.log.error("can't save working-set cache to disk; " + saved.error().description());
     }

@@ -64,6 +64,7 @@ class LocalRootEnumerator : public FileProviderEnumerator {
         FileProviderChangeObserver* observer, LocalAppLibraryManager::Searchable searchable);
     void sendAllItems(FileProviderChangeObserver& observer) const;
     void updateMonitoring();
+    // Not over what is newer.
     void saveWorkingSetCache() const;
     [[nodiscard]] std::uint64_t mainCacheVersion() const;
     [[nodiscard]] bool isWorkingSet() const;

@@ -1,9 +1,13 @@
 #include <algorithm>
 #include <cerrno>
 #include <filesystem>
+#include <functional>
+#include <utility>
 
 #include "platform/hostframework/FileProviderConstants.h"
 #include "platform/testing/CollectingObserver.h"
+#include "platform/testing/ForwardingFileEventService.h"
+#include "platform/testing/PlatformVariants.h"
 #include "providers/marrowdale/LocalRootEnumerator.h"
 #include "providers/marrowdale/apps/AppsTestWorld.h"
 
@@ -297,6 +301,45 @@ TEST_F(LocalRootEnumeratorTest, aWorkingSetCacheThatCantBeSavedStopsNothing) {
     const auto made = enumerator(workingSet);
     EXPECT_EQ(changes(*made, anchorWithVersion(0)), (Calls{"update #org.example.A", "finish"}));
     EXPECT_EQ(countContaining("[ERROR] can't save working-set cache to disk; "), 1U);
+}
+
+// Does something when it is next asked for the event of now: as a new notifier asks.
+class Interrupted : public ForwardingFileEventService {
+  public:
+    using ForwardingFileEventService::ForwardingFileEventService;
+    Expected<EventID> currentEventID() override {
+        if (const auto interruption = std::exchange(next, nullptr)) {
+            interruption();
+        }
+        return ForwardingFileEventService::currentEventID();
+    }
+    std::function<void()> next;
+};
+
+TEST_F(LocalRootEnumeratorTest, theWorkingSetCacheDoesNotGoBackWhereTwoAreUpgradedAtOnce) {
+    Interrupted events(world_.fileEvents);
+    const Platform platform = withFileEvents(world_.platform, events);
+    const auto slow = std::make_shared<LocalRootEnumerator>(platform, workingSet);
+    const Data first = anchorWithVersion(0);
+    add("A");
+    refreshAll();
+    const auto quick = enumerator(workingSet);
+    // Between its upgrade and its save.
+    events.next = [&] {
+        add("B");
+        refreshAll();
+        EXPECT_EQ(changes(*quick, first).back(), "finish");
+    };
+    EXPECT_EQ(changes(*slow, first).front(), "update #org.example.A");
+    EXPECT_EQ(versionIn(next_), 1U);
+    EXPECT_EQ(cached(Source::workingSet), (Lines{"org.example.A", "org.example.B"}));
+    EXPECT_EQ(token(Source::workingSet), 2U);
+    // Whoever begins now is at the newest version, and stays there through a restart.
+    std::optional<Data> anchor;
+    enumerator(workingSet)->currentSyncAnchorWithCompletionHandler([&](const auto& current) {
+        anchor = current;
+    });
+    EXPECT_EQ(versionIn(anchor), 2U);
 }
 
 TEST_F(LocalRootEnumeratorTest, aFreshEnumeratorOfTheWorkingSetGoesOnFromTheCache) {

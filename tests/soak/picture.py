@@ -73,8 +73,10 @@ class Replica:
                 self.note(item["itemIdentifier"], f"updated: {facts(item)}")
                 self.items[item["itemIdentifier"]] = item
 
+    # What was in a folder, or in a library, goes with it. Libraries themselves are not kept here.
     def remove(self, identifier):
-        if self.items.pop(identifier, None) is None or identifier.startswith("did="):
+        was_known = self.items.pop(identifier, None) is not None or identifier.startswith("#")
+        if not was_known or identifier.startswith("did="):
             return
         for known in [k for k, i in self.items.items() if i["parentItemIdentifier"] == identifier]:
             self.note(known, "deleted with " + identifier)

@@ -12,6 +12,7 @@ import urllib.parse
 ROOT = "VantrelRootContainerItemIdentifier"
 WORKING_SET = "VantrelWorkingSetContainerItemIdentifier"
 PATIENCE = 60  # seconds that an answer may take
+LOGS_KEPT = 25
 
 
 class Refused(Exception):
@@ -97,8 +98,10 @@ def children(client, container):
 class Service:
     def __init__(self, programs, home, log):
         self.home, self.log = home, open(log, "ab")
-        self.command = [programs + "/bin/marrowdale", "--json", "serve", "--no-browser"]
-        self.socket = home + "/.local/state/marrowdale/socket"
+        self.verbose = os.environ.get("MARROWDALE_SOAK_VERBOSE")  # the folder for logs, if any
+        self.command = [programs + "/bin/marrowdale", "--json"] + (["--verbose"] if self.verbose else []) + ["serve", "--no-browser"]
+        self.state = home + "/.local/state/marrowdale"
+        self.socket = self.state + "/socket"
         self.clock = home + "/clock"
         with open(self.clock, "wb") as clock:
             clock.write(bytes(8))
@@ -116,6 +119,8 @@ class Service:
     def start(self):
         """Returns when it answers."""
         begun = time.monotonic()
+        if self.verbose:
+            self.begin_log()
         self.process = subprocess.Popen(
             self.command, env=self.environment, stdout=subprocess.PIPE, stderr=self.log, cwd="/"
         )
@@ -123,6 +128,14 @@ class Service:
             raise RuntimeError(f"the service did not start: it ended with {self.process.wait()}")
         self.starts += 1
         self.slowest_start = max(self.slowest_start, time.monotonic() - begun)
+
+    def begin_log(self):
+        """One for each start, and the last ones kept."""
+        self.log.close()
+        self.log = open(f"{self.verbose}/{self.starts:04}.log", "ab")
+        old = f"{self.verbose}/{self.starts - LOGS_KEPT:04}.log"
+        if os.path.exists(old):
+            os.unlink(old)
 
     def kill(self):
         self.process.send_signal(signal.SIGKILL)
@@ -171,7 +184,7 @@ class Service:
 
     def store_size(self):
         size = 0
-        for folder, _, names in os.walk(self.home + "/.local/state/marrowdale"):
+        for folder, _, names in os.walk(self.state):
             for name in names:
                 try:
                     size += os.lstat(os.path.join(folder, name)).st_blocks * 512

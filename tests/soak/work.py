@@ -98,10 +98,10 @@ class Editor(Worker):
         name = self.random.choice(self.names)
         temporary = f"{os.path.dirname(name)}/.save-{self.random.randrange(10**6)}"
         keeps_backup = self.random.random() < 0.5
-        if not os.path.exists(name):  # somebody acted on a folder whose number it has by now
-            self.taken.append(name)
-            self.write(name)
         try:
+            if not os.path.exists(name):  # somebody acted on a folder whose number it has by now
+                self.taken.append(name)
+                self.write(name)
             self.write(temporary)
             if keeps_backup:
                 os.rename(name, name + "~")
@@ -110,7 +110,7 @@ class Editor(Worker):
         except OSError as error:
             if error.errno != errno.ENOSPC:
                 raise
-            if not os.path.exists(name):
+            if not os.path.exists(name) and os.path.exists(name + "~"):
                 os.rename(name + "~", name)
             if os.path.exists(temporary):
                 os.unlink(temporary)

@@ -1,6 +1,8 @@
 // What lies in the libraries of applications: listed, identified and followed like the user's own.
 
 #include <filesystem>
+#include <map>
+#include <memory>
 #include <sys/stat.h>
 
 #include <gmock/gmock.h>
@@ -119,9 +121,62 @@ TEST_F(ApplicationDocumentsTest, clientsOfAServiceAreToldOfApplicationsThatComeA
     }
 }
 
-TEST_F(ApplicationDocumentsTest, anAnchorOfAnOlderListIsExpiredWhereNobodyKeptIt) {
+// With the service goes who waited for its clients; what they may have been told of stays.
+TEST_F(ApplicationDocumentsTest, anchorsOfOlderListsHoldWhenTheServiceIsKilled) {
+    writeFile(inNotes("note.txt"), "");
+    auto service = std::make_unique<Service>(home_);
+    std::map<std::string, std::string> anchors;
+    for (const std::string container : {"root", "working-set", "all-directories"}) {
+        anchors[container] = anchor(container);
+    }
+    home_.install(sketch, "Sketch");
+    makeFolder(home_.library(sketch) + "/drawings");
+    ASSERT_EQ(home_.run({"refresh"}).exitCode, 0);
+    fs::remove(home_.entry(notes));
+    ASSERT_EQ(home_.run({"refresh"}).exitCode, 0);
+    service->kill();
+    service = std::make_unique<Service>(home_);
+    for (const auto& [container, since] : anchors) {
+        const Json answer = changes(container, since);
+        EXPECT_THAT(identifiers(answer.at("updated")), Contains("#" + sketch)) << container;
+        EXPECT_THAT(answer.at("deleted"), Contains(notesItem)) << container;
+        if (container != "root") {
+            EXPECT_THAT(names(answer.at("updated")), Contains("drawings")) << container;
+        }
+        const Json next = changes(container, text(answer, "anchor"));
+        EXPECT_THAT(next.at("updated"), IsEmpty()) << container;
+        EXPECT_THAT(next.at("deleted"), IsEmpty()) << container;
+    }
+}
+
+TEST_F(ApplicationDocumentsTest, anchorsHoldWhenApplicationsComeWhileNothingRuns) {
+    const std::string root = anchor("root");
+    const std::string set = anchor("working-set");
+    home_.install(sketch, "Sketch");
+    writeFile(home_.library(sketch) + "/drawing.png", "");
+    EXPECT_THAT(identifiers(changes("root", root).at("updated")),
+                UnorderedElementsAre("#" + sketch, notesItem));
+    const Json answer = changes("working-set", set);
+    EXPECT_THAT(names(answer.at("updated")), Contains("drawing.png"));
+    fs::remove(home_.entry(sketch));
+    EXPECT_THAT(changes("working-set", text(answer, "anchor")).at("deleted"),
+                ElementsAre("#" + sketch));
+    EXPECT_THAT(changes("working-set", set).at("deleted"), Contains("#" + sketch))
+        << "or never told of it";
+}
+
+TEST_F(ApplicationDocumentsTest, anAnchorOfAnOlderListIsExpiredWhereItsChangesWereLost) {
     const std::string root = anchor("root");
     home_.install(sketch, "Sketch");
+    EXPECT_EQ(home_.run({"apps"}).exitCode, 0);
+    std::size_t removed = 0;
+    for (const auto& each : fs::recursive_directory_iterator(home_.path(".local/state"))) {
+        if (each.path().filename() == "app-libraries.changes") {
+            removed += fs::remove(each.path()) ? 1U : 0U;
+            break;
+        }
+    }
+    ASSERT_EQ(removed, 1U);
     EXPECT_EQ(home_.error({"changes", "root", "--since", root}, 1).at("name"), "syncAnchorExpired");
 }
 

@@ -183,6 +183,13 @@ RowNumber Index::addInLimbo(std::string_view name, const Row& values) {
     return number;
 }
 
+RowNumber Index::folderLeft(RowNumber number) const {
+    const Row& entry = row(number);
+    const bool isNoted = entry.has(Row::limbo) && !entry.isFolder() &&
+                         entry.attributes >= rootRow && entry.attributes < endOfRows_;
+    return isNoted && row(entry.attributes).isFolder() ? entry.attributes : noRow;
+}
+
 bool Index::hasLimbo() const {
     return std::ranges::any_of(limbo_, [this](RowNumber number) {
         return !row(number).isFree() && row(number).has(Row::limbo);
@@ -281,9 +288,13 @@ void Index::removeDocument(RowNumber number) {
 void Index::putInLimbo(RowNumber number) {
     removeName(number);
     unlink(number);
-    row(number).set(Row::limbo, true);
-    row(number).set(Row::seen, false);
-    row(number).parent = noRow;
+    Row& entry = row(number);
+    entry.set(Row::limbo, true);
+    entry.set(Row::seen, false);
+    if (!entry.isFolder()) {
+        entry.attributes = entry.parent;
+    }
+    entry.parent = noRow;
     if (limbo_.size() == limbo_.capacity()) {
         std::erase_if(limbo_, [this](RowNumber other) {
             return row(other).isFree() || !row(other).has(Row::limbo);
@@ -305,6 +316,9 @@ bool Index::place(RowNumber number, RowNumber folder, std::string_view name) {
     }
     entry.parent = folder;
     entry.set(Row::limbo, false);
+    if (!entry.isFolder()) {
+        entry.attributes = 0;
+    }
     link(number);
     insertName(number);
     markRenewed(number);

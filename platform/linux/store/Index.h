@@ -65,6 +65,9 @@ class Index {
     [[nodiscard]] RowNumber addInLimbo(std::string_view name, const Row& values);
     // Takes a placed row off its folder.
     void putInLimbo(RowNumber number);
+    // The folder that a file in limbo was taken off, by this run or the one before; noRow where
+    // none is known. Its row may be another folder's by now, where that was freed.
+    [[nodiscard]] RowNumber folderLeft(RowNumber number) const;
     // Whether rows are in limbo; and which.
     [[nodiscard]] bool hasLimbo() const;
     [[nodiscard]] std::vector<RowNumber> limboRows() const;
@@ -100,7 +103,7 @@ class Index {
     // kind.
     [[nodiscard]] bool restoreTouch(RowNumber number, const Row& values);
     void freeRestoredRow(RowNumber number);
-    // False when there is no such row.
+    // False when there is no such row that could have some.
     [[nodiscard]] bool restoreAttributes(RowNumber number, CarriedAttributes attributes);
     // Room for a chunk's worth of rows that the caller fills, in order from row 0.
     [[nodiscard]] Row* addRawRows(RowNumber count);

@@ -41,14 +41,17 @@ bool Index::restoreTouch(RowNumber number, const Row& values) {
 }
 
 bool Index::restoreAttributes(RowNumber number, CarriedAttributes attributes) {
-    if (number < rootRow || number >= endOfRows_) {
+    if (number < rootRow) {
         return false;
     }
     if (attributes.empty()) {
-        attributes_.erase(number);
-    } else {
-        attributes_.insert_or_assign(number, std::move(attributes));
+        attributes_.erase(number);  // of a row too that was made and removed within one commit
+        return true;
     }
+    if (number >= endOfRows_) {
+        return false;
+    }
+    attributes_.insert_or_assign(number, std::move(attributes));
     return true;
 }
 

@@ -68,5 +68,13 @@ TEST_F(IndexRestoreTest, AKeyWithASlashInItIsDamage) {
     EXPECT_FALSE(isGoodWith(RowKind::folder, rootRow, "/a/b"));
 }
 
+// Logs were written that say so of rows which they never had.
+TEST(IndexRestoreAttributesTest, ARowThatIsNotThereHasNone) {
+    Index index;
+    EXPECT_TRUE(index.restoreAttributes(7, {}));
+    EXPECT_FALSE(index.restoreAttributes(7, {{"user.tag", "red"}}));
+    EXPECT_FALSE(index.restoreAttributes(noRow, {}));
+}
+
 }  // namespace
 }  // namespace marrowdale::native

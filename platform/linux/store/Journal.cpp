@@ -95,7 +95,8 @@ Expected<void> putDirtyRows(FrameStream& out, const Index& index) {
         if (auto done = out.endRecord(); !done) {
             return done;
         }
-        if (index.hasNewAttributes(number)) {
+        // Of a row that is removed the attributes go with it.
+        if (!row.isFree() && index.hasNewAttributes(number)) {
             putAttributes(out.records(), number, index.attributes(number));
             if (auto done = out.endRecord(); !done) {
                 return done;

@@ -46,6 +46,8 @@ class Journal {
                                                                  Index& index, Options options);
 
     [[nodiscard]] std::uint64_t lastEvent() const { return lastEvent_; }
+    // The last one that was committed before this journal was loaded.
+    [[nodiscard]] std::uint64_t lastLoadedEvent() const { return lastLoadedEvent_; }
     // The last document identifier that anybody may have seen: above what the log says, after an
     // end that was not clean.
     [[nodiscard]] std::uint32_t lastDocument() const {
@@ -129,6 +131,7 @@ class Journal {
     SegmentWriter writer_;
     std::uint64_t sequence_ = 0;  // of the last frame
     std::uint64_t lastEvent_ = 0;
+    std::uint64_t lastLoadedEvent_ = 0;
     std::uint32_t lastDocument_ = 0;   // as the log says
     std::uint32_t documentFloor_ = 0;  // end of the range that the run before had
     std::vector<EventGap> gaps_;

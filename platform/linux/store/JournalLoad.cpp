@@ -311,6 +311,7 @@ Expected<std::vector<std::pair<SegmentHeader, std::uint64_t>>> Journal::olderSeg
 }
 
 void Journal::noteGap() {
+    lastLoadedEvent_ = lastEvent_;
     if (range_.eventEnd() > lastEvent_) {
         gaps_.push_back({lastEvent_ + 1, range_.eventEnd()});
         gapIsNew_ = true;

@@ -125,6 +125,60 @@ TEST_F(JournalTest, RowsThatWereTouchedAreLoadedWithTheirNewValues) {
     EXPECT_EQ(world_.index().row(world_.index().child(rootRow, "b")).document, 77U);
 }
 
+// A request may give a document to a file that is gone before the next commit, attributes and all.
+TEST_F(JournalTest, ARowThatWasMadeAndRemovedWithinACommitLeavesNothing) {
+    world_.open();
+    addRoot();
+    addFile("stays", 2);
+    world_.commit();
+    addFile("passes", 3);
+    const RowNumber passing = world_.index().child(rootRow, "passes");
+    ASSERT_EQ(passing + 1, world_.index().endOfRows());
+    world_.index().setAttributes(passing, {{"user.tag", "red"}});
+    world_.index().remove(passing);
+    const auto before = world_.journal().logBytes();
+    world_.commit();
+    EXPECT_EQ(world_.journal().logBytes() - before, frameHeaderSize + 8U) << "that it is removed";
+    world_.close();
+    world_.open();
+    EXPECT_EQ(world_.index().count(), 2U);
+    EXPECT_TRUE(world_.index().allAttributes().empty());
+}
+
+TEST_F(JournalTest, ARowThatIsRemovedTakesItsAttributesAlong) {
+    world_.open();
+    addRoot();
+    addFile("goes", 2);
+    world_.index().setAttributes(world_.index().child(rootRow, "goes"), {{"user.tag", "red"}});
+    world_.commit();
+    world_.index().remove(world_.index().child(rootRow, "goes"));
+    world_.commit();
+    addFile("takes its row", 3);
+    world_.commit();
+    world_.close();
+    world_.open();
+    const RowNumber row = world_.index().child(rootRow, "takes its row");
+    ASSERT_NE(row, noRow);
+    EXPECT_TRUE(world_.index().attributes(row).empty());
+}
+
+TEST_F(JournalTest, AFileInLimboIsLoadedWithTheFolderThatItLeft) {
+    world_.open();
+    addRoot();
+    addFile("a", 2);
+    const RowNumber row = world_.index().child(rootRow, "a");
+    EXPECT_EQ(world_.index().folderLeft(row), noRow);
+    world_.index().putInLimbo(row);
+    world_.commit();
+    world_.close();
+    world_.open();
+    EXPECT_EQ(world_.index().folderLeft(row), rootRow);
+    EXPECT_EQ(world_.index().name(row), "a");
+    ASSERT_TRUE(world_.index().place(row, rootRow, "b"));
+    EXPECT_EQ(world_.index().folderLeft(row), noRow);
+    EXPECT_EQ(world_.index().row(row).attributes, 0U);
+}
+
 TEST_F(JournalTest, PathsOfAnyBytesComeBack) {
     world_.open();
     std::vector<std::string> paths{"",

@@ -53,7 +53,9 @@ struct alignas(64) Row {
     RowNumber next;          // of the same folder
     RowNumber previous;      // the first one's is the last one
     std::uint32_t flags;
-    std::uint32_t attributes;  // of a folder: digest of its own metadata; 0: not looked at yet
+    // Of a folder: digest of its own metadata; 0: not looked at yet. Of a file in limbo: the row of
+    // the folder that it left; 0: none. Else 0.
+    std::uint32_t attributes;
 
     [[nodiscard]] RowKind kind() const { return static_cast<RowKind>(flags & kindBits); }
     [[nodiscard]] bool isFree() const { return kind() == RowKind::free; }

@@ -144,6 +144,7 @@ std::vector<SafeSaves::Transfer> SafeSaves::settle(DeviceID device, Knowledge kn
             forget(number);
         }
     }
+    decided_.clear();
     return std::exchange(transfers_, {});
 }
 
@@ -174,6 +175,9 @@ SafeSaves::Fate SafeSaves::fateOf(Vacancy& vacancy, RowNumber taker, RowNumber o
                                   Knowledge knowledge) const {
     if (taker != noRow && index_.row(taker).document == vacancy.document) {
         return Fate::forget;  // it is back
+    }
+    if (decided_.contains(taker)) {
+        return Fate::forget;  // the name is an earlier one's
     }
     if (old != noRow) {
         const RowNumber oldFolder = index_.row(old).parent;
@@ -267,6 +271,7 @@ void SafeSaves::transfer(const Vacancy& vacancy, RowNumber taker, DeviceID devic
         }
     }
     setDocument(taker, vacancy.document);
+    decided_.insert(taker);
     if (earlier != 0) {
         changes_.documentGone(taker, earlier);
     }

@@ -30,7 +30,9 @@ namespace marrowdale::native {
 //
 // Never across folders, never for a file that is newly made where one was unlinked, and never where
 // the file left, or the other came, by our own doing (OwnMoves). A document whose file turns up
-// again within 15 seconds of its going has its identifier back.
+// again within 15 seconds of its going has its identifier back. Of several that left one name
+// before this was asked to decide, the first keeps it: the others were given out to what stood
+// there in between, by requests that came before the decision.
 //
 // One thread at a time, as the index.
 class SafeSaves {
@@ -128,6 +130,7 @@ class SafeSaves {
     std::unordered_multimap<std::uint64_t, Number> byFile_;
     Number next_ = 0;
     std::vector<Transfer> transfers_;
+    std::set<RowNumber> decided_;  // have the document of their name, by this decision
 };
 
 }  // namespace marrowdale::native

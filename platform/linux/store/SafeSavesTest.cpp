@@ -137,6 +137,48 @@ TEST_F(SafeSavesTest, TheEarlierFileIsDeletedTooLate) {
     EXPECT_EQ(documentAt("doc"), 0U);
 }
 
+TEST_F(SafeSavesTest, WhatWasGivenOutBetweenTwoSavesDoesNotTakeTheName) {
+    appear("doc", 11);
+    index_.setDocument(index_.child(rootRow, "doc"), document + 1);  // somebody asked
+    appear("doc", 12);
+    arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+    const auto transfers = settleAt(std::chrono::seconds(100));
+    ASSERT_EQ(transfers.size(), 1U);
+    EXPECT_EQ(transfers.front().document, document);
+    EXPECT_EQ(documentAt("doc"), document);
+    EXPECT_TRUE(index_.rowsOfDocument(document + 1).empty());
+}
+
+TEST_F(SafeSavesTest, NorDoesItWhenTheNameIsTakenLater) {
+    appear("doc", 11);
+    index_.setDocument(index_.child(rootRow, "doc"), document + 1);
+    vanish("doc");
+    EXPECT_TRUE(settleAt(std::chrono::seconds(100)).empty());
+    appear("doc", 12);
+    arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+    EXPECT_EQ(settleAt(std::chrono::seconds(101)).size(), 1U);
+    EXPECT_EQ(documentAt("doc"), document);
+    // The next save finds it there.
+    appear("doc", 13);
+    arriveBy("doc", SafeSaves::Arrival::renamedWithin, "temporary");
+    EXPECT_EQ(settleAt(std::chrono::seconds(102)).size(), 1U);
+    EXPECT_EQ(documentAt("doc"), document);
+}
+
+// A request had what was found committed, and the process was killed before the decision.
+TEST_F(SafeSavesTest, ANameThatWasLeftInTheRunBeforeIsDecidedAbout) {
+    appear("doc", 11);
+    ASSERT_EQ(index_.limboRows().size(), 1U);
+    TreeChanges changes(index_, packages_);
+    SafeSaves saves(index_, changes, own_);
+    changes.recallDepartures();
+    const auto transfers = saves.settle(DeviceID{1}, SafeSaves::Knowledge::result,
+                                        SafeSaves::Clock::time_point(std::chrono::seconds(1)));
+    ASSERT_EQ(transfers.size(), 1U);
+    EXPECT_EQ(transfers.front().document, document);
+    EXPECT_EQ(documentAt("doc"), document);
+}
+
 TEST_F(SafeSavesTest, AnUnlinkedNameThatIsMadeAnew) {
     vanish("doc");
     (void)settleAt(std::chrono::seconds(100));

@@ -54,6 +54,10 @@ Expected<EventID> Store::barrier() {
     return core_->barrier();
 }
 
+EventID Store::lastEventOfEarlierRuns() const {
+    return core_->lastEventOfEarlierRuns();
+}
+
 EventID Store::lastEventID() {
     return core_->lastEventID();
 }

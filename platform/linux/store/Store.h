@@ -62,6 +62,10 @@ class Store final : public GenerationStore, public EventHistory, public Document
     // can't be looked at.
     [[nodiscard]] Expected<void> setLibraries(std::vector<LibraryFolder> libraries);
 
+    // The newest event when the store was opened: what happened before that and was found by the
+    // look at everything then, the folders' own coming among it, has later ones.
+    [[nodiscard]] EventID lastEventOfEarlierRuns() const;
+
     [[nodiscard]] StoreReport report() const;
 
     // To be told of what this system itself moves and removes below the roots.

@@ -56,6 +56,7 @@ class Store::Core {
         MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<EventID> barrier() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] EventID lastEventID() MARROWDALE_EXCLUDES(mutex_);
+    [[nodiscard]] EventID lastEventOfEarlierRuns() MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] EventHistory::Standing standingOf(EventID since) MARROWDALE_EXCLUDES(mutex_);
     [[nodiscard]] Expected<std::unique_ptr<EventCursor>> eventsSince(EventID since)
         MARROWDALE_EXCLUDES(mutex_);

@@ -215,6 +215,7 @@ Expected<void> Store::Core::loadJournal() {
         return Unexpected(journal.error());
     }
     journal_ = std::move(*journal);
+    changes_.recallDepartures();
     lastDocument_ = journal_->lastDocument();
     return {};
 }

@@ -99,6 +99,11 @@ EventID Store::Core::lastEventID() {
     return EventID{journal_->lastEvent()};
 }
 
+EventID Store::Core::lastEventOfEarlierRuns() {
+    const MutexLock lock(mutex_);
+    return EventID{journal_->lastLoadedEvent()};
+}
+
 EventHistory::Standing Store::Core::standingOf(EventID since) {
     const MutexLock lock(mutex_);
     return journal_->standingOf(since);

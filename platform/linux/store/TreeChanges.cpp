@@ -143,13 +143,8 @@ void TreeChanges::documentLeft(RowNumber number, std::uint32_t document) {
 }
 
 void TreeChanges::leave(RowNumber number) {
-    const Row& row = index_.row(number);
-    const FileID folder{index_.row(row.parent).fileID};
-    if (row.document != 0) {
-        departures_.push_back({row.document, FileID{row.fileID}, row.birth, row.fingerprint,
-                               row.isFolder(), folder, std::string(index_.name(number)),
-                               index_.attributes(number)});
-    }
+    const FileID folder{index_.row(index_.row(number).parent).fileID};
+    noteDeparture(number, folder);
     Told told{.place = toldPlaceOf(number), .wasPackage = isPackage(number)};
     if (const auto moved = moved_.extract(number)) {
         told = std::move(moved.mapped());  // the place where it was told of last
@@ -338,6 +333,23 @@ void TreeChanges::noteRemoved(RowNumber number) {
         removedFolders_.emplace_back(FileID{row.fileID});
         for (RowNumber below = row.firstChild(); below != noRow; below = index_.row(below).next) {
             left.push_back(below);
+        }
+    }
+}
+
+void TreeChanges::noteDeparture(RowNumber number, FileID folder) {
+    const Row& row = index_.row(number);
+    if (row.document != 0) {
+        departures_.push_back({row.document, FileID{row.fileID}, row.birth, row.fingerprint,
+                               row.isFolder(), folder, std::string(index_.name(number)),
+                               index_.attributes(number)});
+    }
+}
+
+void TreeChanges::recallDepartures() {
+    for (const RowNumber number : index_.limboRows()) {
+        if (const RowNumber folder = index_.folderLeft(number); folder != noRow) {
+            noteDeparture(number, FileID{index_.row(folder).fileID});
         }
     }
 }

@@ -69,6 +69,9 @@ class TreeChanges {
         FileID fromFolder{};
         std::string fromName;
     };
+    // Notes again what left when the run before made its last commit, and was found nowhere yet:
+    // whose the name is was not decided.
+    void recallDepartures();
     [[nodiscard]] std::vector<Departure> takeDepartures();
     [[nodiscard]] std::vector<Arrival> takeArrivals();
 
@@ -106,6 +109,7 @@ class TreeChanges {
     enum class Side : std::uint8_t { gone, appeared };
 
     void touch(RowNumber number, std::uint32_t bits);
+    void noteDeparture(RowNumber number, FileID folder);
     [[nodiscard]] Place placeOf(RowNumber number) const;
     // Where the events so far say that it is: deletions are of what somebody was told of.
     [[nodiscard]] Place toldPlaceOf(RowNumber number) const;
@@ -135,7 +139,7 @@ class TreeChanges {
     void flushLimbo();
     void flushTouched();
     void flushRow(RowNumber number, std::uint32_t bits);
-    void flushMove(RowNumber number, const Told& told, const Place& now);
+    void flushMove(RowNumber number, Told told, const Place& now);
     void flushGoneDocuments();
     void flushPackages();
     void flushOtherNames();

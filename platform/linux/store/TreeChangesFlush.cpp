@@ -83,8 +83,14 @@ void TreeChanges::flushRow(RowNumber number, std::uint32_t bits) {
 
 // Two events, and more where what lies below comes to be served, or is served no longer: a folder
 // that became a package, or came out of one.
-void TreeChanges::flushMove(RowNumber number, const Told& told, const Place& now) {
+void TreeChanges::flushMove(RowNumber number, Told told, const Place& now) {
     const bool isFolder = index_.row(number).isFolder();
+    // A folder goes by its number. Whoever knows it as a document may hear of that number again
+    // before he hears of the document: when he looks, it may stand elsewhere, below a folder that
+    // was moved.
+    if (isFolder && told.wasPackage && !isPackage(number) && told.goneDocument == 0) {
+        told.goneDocument = index_.row(number).document;
+    }
     const bool wasOpen = isFolder && !told.wasPackage && told.place.package == noRow;
     const bool isOpen = isFolder && !isPackage(number) && now.package == noRow;
     if (!told.isGone && (told.place.package != noRow || told.place.path != now.path)) {

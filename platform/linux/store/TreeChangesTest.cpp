@@ -261,6 +261,33 @@ TEST_F(TreeChangesTest, AGoneDocumentInAPackageIsToldAtThePackage) {
 }
 
 // Whoever knows a link knows it by the number of what it leads to.
+TEST_F(TreeChangesTest, APackageThatBecomesAFolderIsADocumentNoMore) {
+    const RowNumber folder = addFolder(rootRow, "folder", 10);
+    const RowNumber package = addFolder(rootRow, "a.bundle", 11);
+    index().setDocument(package, 7);
+    move(package, folder, "a.bundle");
+    EXPECT_THAT(commit(),
+                ElementsAre("gone+renamed a.bundle, file 11", "renamed folder/a.bundle, file 11"));
+    move(package, folder, "a");
+    move(folder, rootRow, "moved");
+    EXPECT_THAT(commit(), ElementsAre("gone+renamed folder/a.bundle (did=7), file 11",
+                                      "gone+renamed folder/, file 10", "renamed moved/a/, file 11",
+                                      "renamed moved/, file 10"));
+    EXPECT_EQ(index().row(package).document, 7U) << "it may become one again";
+    move(package, folder, "b.bundle");
+    EXPECT_THAT(commit(),
+                ElementsAre("gone+renamed moved/a/, file 11", "renamed moved/b.bundle, file 11"));
+}
+
+TEST_F(TreeChangesTest, NorIsOneThatWasToldToBeGoneBefore) {
+    const RowNumber package = addFolder(rootRow, "a.bundle", 11);
+    index().setDocument(package, 7);
+    changes().leave(package);
+    EXPECT_THAT(commit(), ElementsAre("gone+renamed a.bundle, file 11"));
+    ASSERT_TRUE(changes().arrive(package, rootRow, "a"));
+    EXPECT_THAT(commit(), ElementsAre("gone a (did=7)", "renamed a/, file 11"));
+}
+
 TEST_F(TreeChangesTest, WhatMovesIntoAPackageIsADocumentNoMore) {
     const RowNumber package = addFolder(rootRow, "a.bundle", 10);
     const RowNumber file = addFile(rootRow, "file", 11);
