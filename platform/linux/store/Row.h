@@ -27,7 +27,7 @@ struct alignas(64) Row {
     static constexpr std::uint32_t untold = 1U << 6U;
     // Those that are kept on disk; the rest lives for one reconcile or one commit.
     static constexpr std::uint32_t lastingFlags = 0x00FFFF7FU;
-    static constexpr std::uint32_t seen = 1U << 24U;      // met by the reconcile that is running
+    static constexpr std::uint32_t seen = 1U << 24U;  // met by the reconcile that is running
     // A folder that was not listed since it is known or the index was loaded, so not watched.
     static constexpr std::uint32_t unlisted = 1U << 25U;
     static constexpr std::uint32_t visiting = 1U << 26U;  // being listed
