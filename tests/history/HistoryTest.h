@@ -53,14 +53,6 @@ inline constexpr std::array everyWay{Following::fanotify, Following::inotify, Fo
 
 using HistoryParameter = std::tuple<TestFileSystem, Following>;
 
-// The same for what is run by hand alone (MARROWDALE_STRESS=1 or more); empty otherwise.
-inline std::vector<Following> byListeningByHand() {
-    const bool isWanted =
-        std::getenv("MARROWDALE_STRESS") != nullptr;  // NOLINT(concurrency-mt-unsafe)
-    return isWanted ? std::vector<Following>(byListening.begin(), byListening.end())
-                    : std::vector<Following>();
-}
-
 // Each file system with each of these ways.
 template <std::size_t count>
 auto followedBy(const std::array<Following, count>& ways) {

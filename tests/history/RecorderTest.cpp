@@ -373,12 +373,7 @@ TEST_P(RecorderTest, WithoutMarksFoldersAreListedAgain) {
 }
 
 INSTANTIATE_TEST_SUITE_P(OnEach, RecorderTest, followedBy(byListening), historyParameterName);
-// No seed repeats what they find, so they are run by hand.
-GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(StormTest);
-INSTANTIATE_TEST_SUITE_P(ByHand, StormTest,
-                         testing::Combine(testing::ValuesIn(testFileSystems()),
-                                          testing::ValuesIn(byListeningByHand())),
-                         historyParameterName);
+INSTANTIATE_TEST_SUITE_P(OnEach, StormTest, followedBy(byListening), historyParameterName);
 
 }  // namespace
 }  // namespace marrowdale::tests
