@@ -3,6 +3,8 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <span>
@@ -35,7 +37,9 @@ enum class FSEventReaderMode : std::uint8_t {
 //
 // Two things are gone to those who know them though their file is not, and are told as deletions of
 // their documents, besides what the event of their old place tells: what was moved to where it is
-// hidden or not monitored, and a package that was renamed and is an ordinary folder now.
+// hidden or not monitored, and a package that was renamed and is an ordinary folder now. Where such
+// a move is read so late that what was moved is not there any more, its document, and those of what
+// was in it, are told when an event says that they are gone from there.
 //
 // An event of the feed of documents is told as a change of the item that holds the document now,
 // wherever that is; so it runs through the same looks (hidden, monitored, present, servable) with
@@ -126,19 +130,22 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
     void allocateDocuments(std::span<const FileEvent> events) const;
     void countAsProcessed(EventID eventID);
     [[nodiscard]] bool handle(const Run& run, FSEventReaderDelegate& delegate,
-                              const FileEvent& event) const;
+                              const FileEvent& event);
     [[nodiscard]] bool handlePath(const Run& run, FSEventReaderDelegate& delegate,
-                                  const FileEvent& event) const;
+                                  const FileEvent& event);
     [[nodiscard]] bool handleDocumentPath(const Run& run, FSEventReaderDelegate& delegate,
-                                          const FileEvent& event) const;
+                                          const FileEvent& event);
     [[nodiscard]] bool handleURL(const Run& run, FSEventReaderDelegate& delegate,
-                                 const FileEvent& event, const URL& url,
-                                 Comparison comparison) const;
+                                 const FileEvent& event, const URL& url, Comparison comparison);
     [[nodiscard]] bool handleItem(const Run& run, FSEventReaderDelegate& delegate,
                                   const FileEvent& event, const URL& url,
                                   std::optional<FileID> otherFile) const;
     [[nodiscard]] bool tellOutOfSight(const Run& run, FSEventReaderDelegate& delegate,
-                                      const FileEvent& event, const URL& url) const;
+                                      const FileEvent& event, const URL& url);
+    [[nodiscard]] bool tellGoneOutOfSight(const Run& run, FSEventReaderDelegate& delegate,
+                                          const FileEvent& event, const URL& url);
+    // That place itself, or one in it; `path` is absolute.
+    [[nodiscard]] bool isBelowUntold(std::string_view path) const;
     [[nodiscard]] bool tellDocumentAt(const Run& run, FSEventReaderDelegate& delegate,
                                       const FileEvent& event, const URL& url) const;
     [[nodiscard]] bool tellDeletions(const Run& run, FSEventReaderDelegate& delegate,
@@ -164,6 +171,10 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
     const std::weak_ptr<FSEventReaderDelegate> delegate_;
     const SerialQueue streamQueue_{queueLabel};
     std::atomic<EventID> lastProcessedFSEventID_;
+    // Places out of sight to which something was moved that was not there any more when the event's
+    // turn came, so that nobody was told of its document, and whether it is known to have left
+    // since. On the queue alone.
+    std::map<std::string, bool, std::less<>> untold_;
     mutable Mutex mutex_;
     std::unique_ptr<FileEventStream> stream_ MARROWDALE_GUARDED_BY(mutex_);
     std::shared_ptr<Run> run_ MARROWDALE_GUARDED_BY(mutex_);  // of stream_

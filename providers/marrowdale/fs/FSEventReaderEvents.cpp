@@ -83,6 +83,8 @@ std::shared_ptr<LocalItem> makeItem(const Platform& platform, const URL& url) {
 
 void FSEventReader::handleBatch(const Run& run, std::span<const FileEvent> events) {
     logDecision([&] { return "fsevent: received " + std::to_string(events.size()) + " events"; });
+    // What left with an event of an earlier batch has no more events.
+    std::erase_if(untold_, [](const auto& untold) { return untold.second; });
     if (delegate_.lock() && !run.isStopped) {
         allocateDocuments(events);
     }
@@ -130,7 +132,7 @@ void FSEventReader::countAsProcessed(EventID eventID) {
 }
 
 bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate,
-                           const FileEvent& event) const {
+                           const FileEvent& event) {
     if (says(event, FileEventFlag::eventIDsWrapped)) {
         if (verbose_) {
             platform_.log.info([] { return "fsevents id wrapped"; });
@@ -157,7 +159,7 @@ bool FSEventReader::handle(const Run& run, FSEventReaderDelegate& delegate,
 }
 
 bool FSEventReader::handlePath(const Run& run, FSEventReaderDelegate& delegate,
-                               const FileEvent& event) const {
+                               const FileEvent& event) {
     if (!event.path || event.path->empty()) {
         platform_.log.error("ignore event " + marrowdale::description(event) +
                             " because no path can be extracted");
@@ -173,7 +175,7 @@ bool FSEventReader::handlePath(const Run& run, FSEventReaderDelegate& delegate,
 }
 
 bool FSEventReader::handleDocumentPath(const Run& run, FSEventReaderDelegate& delegate,
-                                       const FileEvent& event) const {
+                                       const FileEvent& event) {
     DocIDChange change;
     if (!parseDocIDChangePath(*event.path, change)) {
         platform_.log.error("can't parse docID path " + quoted(*event.path) +
@@ -212,7 +214,7 @@ bool FSEventReader::isInPackage(const URL& url) const {
 }
 
 bool FSEventReader::handleURL(const Run& run, FSEventReaderDelegate& delegate,
-                              const FileEvent& event, const URL& url, Comparison comparison) const {
+                              const FileEvent& event, const URL& url, Comparison comparison) {
     switch (placeOf(url)) {
         case Place::hidden:
             logDecision([&] { return "dropping fsevent at " + url.path() + "; URL is hidden"; });
@@ -269,16 +271,41 @@ bool FSEventReader::handleItem(const Run& run, FSEventReaderDelegate& delegate,
 // rest on another file with that of the one before. A file of several names may be in sight under
 // another one, which its number tells as well.
 bool FSEventReader::tellOutOfSight(const Run& run, FSEventReaderDelegate& delegate,
-                                   const FileEvent& event, const URL& url) const {
+                                   const FileEvent& event, const URL& url) {
+    if (says(event, FileEventFlag::gone)) {
+        return tellGoneOutOfSight(run, delegate, event, url);
+    }
     if (!isMoveToHere(event) && !says(event, FileEventFlag::documentMoved)) {
         return true;
     }
     const auto file = platform_.fileSystem.openForEvents(url);
     const auto attributes = file ? platform_.fileSystem.commonAttributes(**file)
                                  : Expected<CommonAttributes>(Unexpected(file.error()));
+    if (!attributes || (event.fileID && attributes->fileID != *event.fileID)) {
+        untold_.try_emplace(url.path(), false);
+    }
     const bool hasOtherNames = attributes && attributes->fileID == event.fileID &&
                                attributes->type != FileType::directory && attributes->linkCount > 1;
     return hasOtherNames || tellDocumentAt(run, delegate, event, url);
+}
+
+// What is hidden is nobody's, unless it came there unseen from where it was somebody's.
+bool FSEventReader::tellGoneOutOfSight(const Run& run, FSEventReaderDelegate& delegate,
+                                       const FileEvent& event, const URL& url) {
+    const bool isToTell = event.goneDocument != DocumentID{} && isBelowUntold(url.path());
+    if (const auto untold = untold_.find(url.path()); untold != untold_.end()) {
+        untold->second = true;
+    }
+    return !isToTell ||
+           tellDeletion(run, delegate, event, url,
+                        MRWFileObjectIdentifier::fromDocumentID(raw(event.goneDocument)));
+}
+
+bool FSEventReader::isBelowUntold(std::string_view path) const {
+    while (!path.empty() && !untold_.contains(path)) {
+        path = path.substr(0, path.rfind('/'));
+    }
+    return !path.empty();
 }
 
 // What stands there is no document to anybody any more, though its number stays with it.

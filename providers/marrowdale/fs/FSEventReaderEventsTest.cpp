@@ -216,6 +216,26 @@ TEST_P(FSEventReaderEventsTest, aDocumentIsGoneWhereItsFilesNumberWasGivenToAnot
     EXPECT_EQ(delegate_->told, (Lines{"change a 11", "delete did=77 " + world_.path("a") + " 11"}));
 }
 
+// Whoever knew the document where it was in sight is told by nothing else.
+TEST_P(FSEventReaderEventsTest, whatWasOutOfSightOnlyBetweenTwoLooksIsToldWhenItIsGone) {
+    tell({event(".Trash/a", FileEventFlag::renamed, FileID{5}), gone(".Trash/a", FileID{5}, 7),
+          event(".Trash/folder", FileEventFlag::renamed | FileEventFlag::isFolder, FileID{6}),
+          gone(".Trash/folder/b", FileID{8}, 9), gone(".Trash/folder", FileID{6}),
+          gone(".Trash/folder 2", FileID{8}, 10)});
+    EXPECT_EQ(delegate_->told, (Lines{"delete did=7 " + world_.path(".Trash/a") + " 12",
+                                      "delete did=9 " + world_.path(".Trash/folder/b") + " 14"}));
+    tell({gone(".Trash/a", FileID{5}, 11), gone(".Trash/folder/b", FileID{8}, 12)});
+    EXPECT_EQ(delegate_->told.size(), 2U);
+}
+
+TEST_P(FSEventReaderEventsTest, whatIsGoneFromWhereItWasSeenOutOfSightIsDropped) {
+    makeFolder(world_.path(".Trash/folder"));
+    tell({event(".Trash/folder", FileEventFlag::renamed | FileEventFlag::isFolder,
+                fileIDOf(".Trash/folder")),
+          gone(".Trash/folder/b", FileID{8}, 9), gone(".Trash/folder", fileIDOf(".Trash/folder"))});
+    EXPECT_EQ(delegate_->told, Lines{});
+}
+
 TEST_P(FSEventReaderEventsTest, hiddenPathsAreDropped) {
     makeFolder(world_.path(".Trash"));
     writeFile(world_.path(".Trash/a"), "");
