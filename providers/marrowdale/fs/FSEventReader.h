@@ -38,8 +38,8 @@ enum class FSEventReaderMode : std::uint8_t {
 // Two things are gone to those who know them though their file is not, and are told as deletions of
 // their documents, besides what the event of their old place tells: what was moved to where it is
 // hidden or not monitored, and a package that was renamed and is an ordinary folder now. Where such
-// a move is read so late that what was moved is not there any more, its document, and those of what
-// was in it, are told when an event says that they are gone from there.
+// a move is read so late that what was moved is not there any more, its document, and what was in
+// it, are told when an event says that they are gone from there.
 //
 // An event of the feed of documents is told as a change of the item that holds the document now,
 // wherever that is; so it runs through the same looks (hidden, monitored, present, servable) with

@@ -292,11 +292,18 @@ bool FSEventReader::tellOutOfSight(const Run& run, FSEventReaderDelegate& delega
 // What is hidden is nobody's, unless it came there unseen from where it was somebody's.
 bool FSEventReader::tellGoneOutOfSight(const Run& run, FSEventReaderDelegate& delegate,
                                        const FileEvent& event, const URL& url) {
-    const bool isToTell = event.goneDocument != DocumentID{} && isBelowUntold(url.path());
+    const bool isUntold = isBelowUntold(url.path());
     if (const auto untold = untold_.find(url.path()); untold != untold_.end()) {
         untold->second = true;
     }
-    return !isToTell ||
+    if (!isUntold) {
+        return true;
+    }
+    if (says(event, FileEventFlag::isFolder) && event.fileID) {
+        return tellDeletion(run, delegate, event, url,
+                            MRWFileObjectIdentifier::fromFileID(raw(*event.fileID)));
+    }
+    return event.goneDocument == DocumentID{} ||
            tellDeletion(run, delegate, event, url,
                         MRWFileObjectIdentifier::fromDocumentID(raw(event.goneDocument)));
 }

@@ -220,12 +220,16 @@ TEST_P(FSEventReaderEventsTest, aDocumentIsGoneWhereItsFilesNumberWasGivenToAnot
 TEST_P(FSEventReaderEventsTest, whatWasOutOfSightOnlyBetweenTwoLooksIsToldWhenItIsGone) {
     tell({event(".Trash/a", FileEventFlag::renamed, FileID{5}), gone(".Trash/a", FileID{5}, 7),
           event(".Trash/folder", FileEventFlag::renamed | FileEventFlag::isFolder, FileID{6}),
-          gone(".Trash/folder/b", FileID{8}, 9), gone(".Trash/folder", FileID{6}),
+          gone(".Trash/folder/b", FileID{8}, 9), gone(".Trash/folder/c", FileID{9}),
           gone(".Trash/folder 2", FileID{8}, 10)});
+    FileEvent folder = gone(".Trash/folder", FileID{6});
+    folder.flags |= FileEventFlag::isFolder;
+    tell({folder});
     EXPECT_EQ(delegate_->told, (Lines{"delete did=7 " + world_.path(".Trash/a") + " 12",
-                                      "delete did=9 " + world_.path(".Trash/folder/b") + " 14"}));
+                                      "delete did=9 " + world_.path(".Trash/folder/b") + " 14",
+                                      "delete fid=6 " + world_.path(".Trash/folder") + " 17"}));
     tell({gone(".Trash/a", FileID{5}, 11), gone(".Trash/folder/b", FileID{8}, 12)});
-    EXPECT_EQ(delegate_->told.size(), 2U);
+    EXPECT_EQ(delegate_->told.size(), 3U);
 }
 
 TEST_P(FSEventReaderEventsTest, whatIsGoneFromWhereItWasSeenOutOfSightIsDropped) {
