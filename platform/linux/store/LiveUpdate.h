@@ -22,14 +22,14 @@ class LiveUpdate {
         std::vector<HintSet::Hint> hints;
         // The root was moved, removed or unmounted.
         bool rootMoved = false;
-        // Folders that are new were moved before they could be listed.
+        // Folders not listed yet that were moved before they could be.
         std::vector<RowNumber> missedFolders;
     };
 
     explicit LiveUpdate(const TreeScope& scope);
 
-    // Looks at every place, lists the folders that are new, and puts in limbo what is not where it
-    // was. Errors: a new folder can't be listed for want of memory or descriptors.
+    // Looks at every place, lists folders that never were, and puts in limbo what is not where it
+    // was. Errors: a folder can't be listed for want of memory or descriptors.
     [[nodiscard]] Expected<Left> process(HintSet& hints);
 
   private:
